@@ -1,0 +1,34 @@
+#pragma once
+
+#include <string>
+
+/// The file-system operations of the program. They turn a failed system call into a printed
+/// message followed by an exception, and take a missing entry for a normal outcome.
+///
+/// Paths and link contents are NUL-terminated byte strings, handed to the system call unchanged.
+///
+/// Every failure throws the call's error number as a plain `int`, after its message, and errno
+/// still holds that number when the exception arrives at its handler: a handler that adds a
+/// message of its own reports errno.
+namespace fs {
+
+/// Removes the entry at `path`: a link itself, never what it points at; never a directory.
+/// A path that does not exist is fine.
+/// On failure prints "remove: could not remove %s" and throws `int`.
+void remove(const char* path);
+
+/// Whether `path` exists, links followed: false for a link whose target is missing, and for any
+/// failure, whose number is then in errno. Prints and throws nothing.
+[[nodiscard]] bool exists(const char* path) noexcept;
+
+/// The content of the link at `path`, as stored; no more than its first 1024 bytes.
+/// Empty when nothing exists at `path`.
+/// On failure (not a link, say) prints "read_symlink: %s" and throws `int`.
+[[nodiscard]] std::string read_symlink(const char* path);
+
+/// Makes a link at `link` with the content `target`, which need not exist. Replaces nothing:
+/// an entry at `link`, even a link whose target is missing, is a failure.
+/// On failure prints "create_symlink: from %s to %s" (the link's path first) and throws `int`.
+void create_symlink(const char* target, const char* link);
+
+}  // namespace fs

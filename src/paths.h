@@ -1,0 +1,36 @@
+#pragma once
+
+/// Every path that a run touches, except what lies below a link's target.
+/// All are absolute and none is configurable.
+namespace paths {
+
+// The system copy, shipped read-only with the operating system.
+inline constexpr const char* system_zoneinfo = "/usr/share/zoneinfo.default";
+inline constexpr const char* system_icu = "/usr/share/icu";
+
+// The storage. The two directories carry a trailing slash; a download is named by `downloads`
+// followed by its version text.
+inline constexpr const char* storage = "/var/db/timezone/";
+inline constexpr const char* downloads = "/var/db/timezone/tz/";
+
+// The active copy: what libc's zoneinfo readers and ICU follow. There is no ICU link while the
+// system copy is active.
+inline constexpr const char* zoneinfo_link = "/var/db/timezone/zoneinfo";
+inline constexpr const char* icu_link = "/var/db/timezone/icutz";
+
+// Names the newest download; set by whatever downloads.
+inline constexpr const char* latest_link = "/var/db/timezone/tz_latest";
+
+// Names the local zone's file, reached through `zoneinfo_link`.
+inline constexpr const char* localtime_link = "/var/db/timezone/localtime";
+
+// Tells which version the last switch came from and which it went to.
+inline constexpr const char* record = "/var/db/timezone/TZVersionDiffRecord";
+
+// Left by earlier systems: an ICU link in another place, an obsolete entry, and the tree that
+// `localtime_link` used to point into.
+inline constexpr const char* legacy_icu_link = "/var/db/icutz";
+inline constexpr const char* legacy_icu = "/var/db/icu";
+inline constexpr const char* legacy_zoneinfo = "/usr/share/zoneinfo";
+
+}  // namespace paths

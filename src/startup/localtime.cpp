@@ -1,0 +1,51 @@
+#include "startup/localtime.h"
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <string>
+
+#include "fs/operations.h"
+#include "fs/report.h"
+#include "paths.h"
+
+namespace {
+
+constexpr const char* default_zone = "America/Los_Angeles";
+constexpr const char* default_target = "/var/db/timezone/zoneinfo/America/Los_Angeles";
+
+/// Puts a link in the place of whatever can be removed there: unlike `fs::remove`, the C library's
+/// remove(3) takes an empty directory away too, and is silent where it fails.
+void replace_localtime_link(const char* target) {
+  static_cast<void>(std::remove(paths::localtime_link));
+  fs::create_symlink(target, paths::localtime_link);
+}
+
+/// Whether the link is good as it stands, or has been corrected. Where it is not, errno holds the
+/// number of the call that found out, or 0; the same when it throws.
+bool keep_or_correct() {
+  const std::string target = fs::read_symlink(paths::localtime_link);
+  if (target.starts_with(paths::zoneinfo_link)) return true;
+  if (!target.starts_with(paths::legacy_zoneinfo)) {
+    errno = target.empty() ? ENOENT : 0;
+    return false;
+  }
+  const std::string corrected =
+      paths::zoneinfo_link + target.substr(std::strlen(paths::legacy_zoneinfo));
+  fs::report(0, "Correcting localtime link to %s", {corrected.c_str()});
+  if (!fs::exists(corrected.c_str())) return false;
+  replace_localtime_link(corrected.c_str());
+  return true;
+}
+
+}  // namespace
+
+void repair_localtime_link() {
+  try {
+    if (keep_or_correct()) return;
+  } catch (...) {
+    // Reported where it was thrown; like a link that points nowhere, it ends in the reset.
+  }
+  fs::report(errno, "localtime link invalid; resetting to %s", {default_zone});
+  replace_localtime_link(default_target);
+}
