@@ -1,4 +1,5 @@
 #include "startup/localtime.h"
+#include "startup/storage.h"
 
 namespace {
 
@@ -14,6 +15,9 @@ void attempt(void (*stage)()) noexcept {
 }  // namespace
 
 int main(int /*count*/, char** /*arguments*/) {
+  attempt(prepare_storage);
+  attempt(migrate_legacy_icutz);
+  attempt(remove_legacy_icu);
   attempt(repair_localtime_link);
   return 0;
 }
