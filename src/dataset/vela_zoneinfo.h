@@ -1,0 +1,31 @@
+#pragma once
+
+#include <string>
+
+#include "dataset/vela_dataset_component.h"
+
+/// A zoneinfo tree, made active by "/var/db/timezone/zoneinfo".
+class vela_zoneinfo final : public vela_dataset_component {
+ public:
+  /// The system copy's tree.
+  vela_zoneinfo() : vela_zoneinfo(std::string()) {}
+
+  /// The tree "zoneinfo" in the directory `path`, or the system copy's for the empty path. Reads
+  /// the version text from the tree's "+VERSION"; a file that cannot be read gives an empty one.
+  explicit vela_zoneinfo(const std::string& path);
+
+  /// The first word of "+VERSION", of whatever form.
+  [[nodiscard]] const std::string& get_version_text() const { return version_text; }
+
+  /// Always: any tree can serve in the place of any other.
+  [[nodiscard]] bool compatible_schema(const vela_dataset_component& other) const override;
+
+  /// Replaces "/var/db/timezone/zoneinfo" by a link to this tree, whether or not it exists.
+  /// Prints "Unlink of zoneinfo softlink failed" when the old link cannot be removed, and tries to
+  /// create the new one all the same; throws `int` when that fails.
+  void activate() const override;
+
+ private:
+  const std::string zoneinfo_path;
+  const std::string version_text;
+};

@@ -1,0 +1,67 @@
+#include "fs/file.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <new>
+
+#include "fs/descriptor.h"
+#include "fs/gathered_text.h"
+
+namespace fs {
+namespace {
+
+/// Opens `path` unless something other than a regular file stands there. It asks before it opens,
+/// because opening alone can set a device to work; O_NONBLOCK is for an entry that changes between
+/// the two calls.
+descriptor open_regular(const char* path, int flags) noexcept {
+  constexpr mode_t new_file_mode = 0666;
+  struct stat found {};
+  if (::stat(path, &found) == 0 && !S_ISREG(found.st_mode)) return descriptor(-1);
+  return descriptor(::open(path, flags | O_CLOEXEC | O_NONBLOCK, new_file_mode));
+}
+
+bool is_blank(char byte) noexcept {
+  return byte == ' ' || (byte >= '\t' && byte <= '\r');
+}
+
+/// The first word read from an open descriptor; may throw std::bad_alloc.
+std::string first_word(int file) {
+  std::string word;
+  std::array<char, 4096> block;
+  for (;;) {
+    const ssize_t count = ::read(file, block.data(), block.size());
+    if (count < 0) return {};
+    if (count == 0) return word;
+    const char* begin = block.data();
+    const char* const end = begin + count;
+    if (word.empty()) begin = std::find_if_not(begin, end, is_blank);
+    const char* const word_end = std::find_if(begin, end, is_blank);
+    word.append(begin, word_end);
+    if (word_end != end) return word;
+  }
+}
+
+}  // namespace
+
+std::string read_first_word(const char* path) noexcept {
+  const descriptor file = open_regular(path, O_RDONLY);
+  if (!file.is_open()) return {};
+  try {
+    return first_word(file.get());
+  } catch (const std::bad_alloc&) {
+    return {};
+  }
+}
+
+void write_file(const char* path, std::initializer_list<std::string_view> texts) noexcept {
+  gathered_text content;
+  for (const std::string_view text : texts) content.append(text);
+  const descriptor file = open_regular(path, O_WRONLY | O_CREAT | O_TRUNC);
+  if (file.is_open()) content.write_to(file.get());
+}
+
+}  // namespace fs

@@ -1,0 +1,22 @@
+#pragma once
+
+#include <initializer_list>
+#include <string>
+#include <string_view>
+
+/// The two things done with the content of files. Both are silent: a file that cannot be read or
+/// written is as good as none. Only a regular file counts, behind links too; a FIFO or a device
+/// in its place is neither opened nor waited for.
+namespace fs {
+
+/// The first word of the file at `path`: the bytes (NULs included) between leading white space of
+/// the C locale and the next white space or the end of the file; of any length.
+/// Empty when the file is missing, not regular, cannot be read to the word's end, holds nothing
+/// but white space, or holds a word for which there is no memory. Prints and throws nothing.
+[[nodiscard]] std::string read_first_word(const char* path) noexcept;
+
+/// Makes the file at `path` hold exactly `texts` (nine at most), one after the other; a new file
+/// gets mode 0666 less the umask. Failures are ignored. Prints and throws nothing.
+void write_file(const char* path, std::initializer_list<std::string_view> texts) noexcept;
+
+}  // namespace fs
