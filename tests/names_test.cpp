@@ -1,9 +1,20 @@
 #include <fstream>
 
+#include "dataset/vela_icu.h"
 #include "fs/file.h"
 #include "world.h"
 
 namespace {
+
+TEST(Names, SchemasOfDataFiles) {
+  const std::pair<const char*, const char*> table[] = {
+      {"icutz44l.dat", "44l"}, {"icutz044b.dat", "044b"}, {"icutz44.dat", ""},
+      {"icutz44L.dat", ""},    {"icutz44lb.dat", ""},     {"xicutz44l.dat", ""},
+      {"icutzl.dat", ""},      {"icutz44l.dat.bak", ""},  {"icutz44l.datx", ""},
+      {"icutz.dat", ""},       {"icutz4x4e.dat", ""},     {"icutz44l_dat", ""},
+  };
+  for (const auto& [name, schema] : table) EXPECT_EQ(data_file_schema(name), schema) << name;
+}
 
 TEST(Names, FirstWords) {
   const std::string long_word(300000, '7');

@@ -4,6 +4,7 @@
 #include <regex>
 #include <stdexcept>
 
+#include "dataset/vela_icu.h"
 #include "dataset/vela_version.h"
 
 namespace {
@@ -53,9 +54,10 @@ TEST(Version, Order) {
   EXPECT_EQ(parsed("02022a.01.00"), parsed("2022a.1.0"));
 }
 
-/// The pattern that the scanner stands for decides about random texts of the bytes that matter.
-TEST(Version, AgreesWithItsPattern) {
+/// The patterns that the scanners stand for decide about random texts of the bytes that matter.
+TEST(Scanners, AgreeWithTheirPatterns) {
   const std::regex version_pattern(R"(([0-9]+)([a-z]+)(?:\.([0-9]+))?(?:\.([0-9]+))?)");
+  const std::regex data_file_pattern(R"(icutz([0-9]+[lbe])\.dat)");
   std::mt19937 random(2022);
   const auto text_of = [&random](const std::string& alphabet) {
     std::string text(random() % 9, '\0');
@@ -71,6 +73,10 @@ TEST(Version, AgreesWithItsPattern) {
     ASSERT_EQ(version.letters, match.str(2)) << text;
     ASSERT_EQ(version.major, match[3].matched ? std::stoi(match.str(3)) : -1) << text;
     ASSERT_EQ(version.minor, match[4].matched ? std::stoi(match.str(4)) : -1) << text;
+
+    const std::string name = "icutz" + text_of("0199lbe/:.d") + (round % 8 != 0 ? ".dat" : "");
+    const bool named = std::regex_match(name, match, data_file_pattern);
+    ASSERT_EQ(data_file_schema(name), named ? match.str(1) : "") << name;
   }
 }
 

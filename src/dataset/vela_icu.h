@@ -1,0 +1,44 @@
+#pragma once
+
+#include <string>
+#include <string_view>
+
+#include "dataset/vela_dataset_component.h"
+
+/// A directory of ICU time-zone data, made active by "/var/db/timezone/icutz"; the system copy is
+/// active when that link is absent.
+class vela_icu final : public vela_dataset_component {
+ public:
+  /// The system copy's ICU data.
+  vela_icu() : vela_icu(std::string()) {}
+
+  /// The ICU data "icutz" in the directory `path`, or the system copy's for the empty path.
+  /// Throws what `initialize` throws.
+  explicit vela_icu(const std::string& path);
+
+  /// Whether `other` is ICU data of the same schema. Anything but ICU data prints
+  /// "vela_icu::compatible_schema: could not dynamic_cast other component".
+  [[nodiscard]] bool compatible_schema(const vela_dataset_component& other) const override;
+
+  /// Removes "/var/db/timezone/icutz" and the legacy "/var/db/icutz"; then, for a download, links
+  /// the former to this directory. Prints "unlink of ICU softlink failed" when a removal fails,
+  /// and goes on; throws `int` when the link cannot be created.
+  void activate() const override;
+
+ private:
+  /// Finds the schema: the first word of the system copy's "icutzformat.txt", or the schema in the
+  /// name of the first data file that the walk over a download's directory meets. A download
+  /// without one prints "No ICU schema found for %s".
+  /// Prints "tz_icu::initialize: fts_open of %s failed, %s" and throws `int` when the walk cannot
+  /// be started.
+  void initialize();
+
+  /// Walks a download's directory for `initialize`.
+  void find_data_file();
+
+  std::string schema;
+  std::string icu_path;
+};
+
+/// The schema in the name of an ICU data file, 44l for icutz44l.dat; empty for any other name.
+[[nodiscard]] std::string_view data_file_schema(std::string_view name);
