@@ -1,7 +1,10 @@
 #include <fstream>
 
+#include "dataset/vela_dataset.h"
 #include "dataset/vela_icu.h"
+#include "dataset/vela_zoneinfo.h"
 #include "fs/file.h"
+#include "startup/dataset_links.h"
 #include "world.h"
 
 namespace {
@@ -14,6 +17,27 @@ TEST(Names, SchemasOfDataFiles) {
       {"icutz.dat", ""},       {"icutz4x4e.dat", ""},     {"icutz44l_dat", ""},
   };
   for (const auto& [name, schema] : table) EXPECT_EQ(data_file_schema(name), schema) << name;
+}
+
+TEST(Names, DatasetPathsOfLinks) {
+  const std::string tz = "/var/db/timezone/tz/";
+  const std::pair<std::string, std::string> good[] = {
+      {tz + "2022a.1.0/zoneinfo", tz + "2022a.1.0"},
+      {tz + "2022a.1.0/other", tz + "2022a.1.0"},
+      {tz + "a/b/zoneinfo", tz + "a/b"},
+      {tz + "2022a.1.0/zoneinfo/", tz + "2022a.1.0/zoneinfo"},
+      {tz + "/a/zoneinfo", tz + "/a"},
+      {tz + "a/", tz + "a"},
+      {"/usr/share/zoneinfo.default", ""},
+  };
+  for (const auto& [target, path] : good) EXPECT_EQ(dataset_path_from_link(target), path) << target;
+  for (const std::string& target :
+       {std::string(), tz, tz + "2022a.1.0", tz + "/zoneinfo", tz + "/",
+        std::string("tz/a/zoneinfo"), std::string("/usr/share/zoneinfo"),
+        std::string("/usr/share/zoneinfo.default/"),
+        std::string("/var/db/timezone/tzx/a/zoneinfo")}) {
+    EXPECT_THROW(static_cast<void>(dataset_path_from_link(target)), int) << target;
+  }
 }
 
 TEST(Names, FirstWords) {
@@ -37,6 +61,20 @@ TEST(Names, FirstWords) {
   }
   EXPECT_EQ(fs::read_first_word("/var/tmp"), "");
   EXPECT_EQ(fs::read_first_word("/dev/zero"), "");
+}
+
+TEST(Datasets, CompareByTheirParts) {
+  make_world(system_copy("2022a", "44l") + download("2022a.1.0", "44l") + download("2022b", "45l"));
+  const vela_dataset system;
+  const vela_dataset same("/var/db/timezone/tz/2022a.1.0");
+  const vela_dataset other("/var/db/timezone/tz/2022b");
+  EXPECT_EQ(system.get_version_string(), "2022a.1.0");
+  EXPECT_TRUE(system == vela_dataset("") && !(system == same));
+  EXPECT_TRUE(same.compatible_schema(system) && !other.compatible_schema(system));
+  EXPECT_TRUE(other > same && !(same > other) && !(same > system) && !(system > same));
+  EXPECT_TRUE(vela_zoneinfo().compatible_schema(vela_icu()));
+  EXPECT_FALSE(vela_icu().compatible_schema(vela_zoneinfo()));
+  EXPECT_THROW(vela_dataset("/var/db/timezone/tz/"), std::invalid_argument);
 }
 
 }  // namespace

@@ -1,0 +1,44 @@
+#include "dataset/vela_dataset.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <stdexcept>
+#include <string_view>
+#include <utility>
+
+#include "dataset/vela_icu.h"
+#include "dataset/vela_zoneinfo.h"
+#include "fs/report.h"
+#include "paths.h"
+
+vela_dataset::vela_dataset(std::string dataset_path) : path(std::move(dataset_path)) {
+  create_components();
+}
+
+void vela_dataset::create_components() {
+  constexpr std::string_view downloads = paths::downloads;
+  const std::shared_ptr<vela_zoneinfo> zoneinfo(new vela_zoneinfo(path));
+  if (path.empty()) {
+    version_string = zoneinfo->get_version_text() + ".1.0";
+  } else if (path.size() > downloads.size() && path.starts_with(downloads)) {
+    version_string = path.substr(downloads.size());
+  } else {
+    errno = 0;
+    fs::report(errno, "vela_dataset::create_components: bad path %s", {path.c_str()});
+    throw std::invalid_argument("badpath");
+  }
+  version.parse(version_string);
+  components.push_back(zoneinfo);
+  components.push_back(std::shared_ptr<vela_dataset_component>(new vela_icu(path)));
+}
+
+bool vela_dataset::compatible_schema(const vela_dataset& other) const {
+  return std::equal(
+      components.begin(), components.end(),  //
+      other.components.begin(), other.components.end(),
+      [](const auto& mine, const auto& theirs) { return mine->compatible_schema(*theirs); });
+}
+
+void vela_dataset::activate() const {
+  for (const auto& component : components) component->activate();
+}

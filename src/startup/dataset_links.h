@@ -1,0 +1,24 @@
+#pragma once
+
+#include <string>
+
+/// The links that name datasets, as dataset paths: the directory of a download, or the empty text
+/// for the system copy.
+
+/// The target of "/var/db/timezone/tz_latest" as it stands; empty when there is no such link.
+/// Throws what `fs::read_symlink` throws.
+[[nodiscard]] std::string latest_dataset_path();
+
+/// The dataset path of the active copy, from "/var/db/timezone/zoneinfo".
+/// Throws what `fs::read_symlink` and `dataset_path_from_link` throw; a missing link is a bad one.
+[[nodiscard]] std::string current_dataset_path();
+
+/// The dataset path that the zoneinfo link's content `target` stands for: what comes before its
+/// last "/" for a tree in a download, empty for exactly the system copy's tree.
+/// Anything else prints "Bad zoneinfo link %s" and throws the `int` -1; errno is then ENOENT for
+/// an empty target, that of a missing link, and otherwise 0.
+[[nodiscard]] std::string dataset_path_from_link(const std::string& target);
+
+/// Makes the system copy, read afresh, the active one. Prints nothing of its own; throws what the
+/// construction and the activation of the system dataset throw.
+void reset_to_system();
