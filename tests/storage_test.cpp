@@ -32,6 +32,21 @@ const std::vector<scene> scenes = {
       "remove: could not remove /var/db/icutz: Is a directory",
       "Could not remove /var/db/icutz: Is a directory"},
      ""},
+    {"no_storage",
+     system_copy("2022a", "44l") + "/var/db/icutz>/usr",
+     {"create_symlink: from /var/db/timezone/icutz to /usr: No such file or directory",
+      could_not_migrate + "No such file or directory",
+      "Bad zoneinfo link : No such file or directory",
+      "Invalid current symlinks; resetting to system partition: No such file or directory",
+      "create_symlink: from /var/db/timezone/zoneinfo to /usr/share/zoneinfo.default: "
+      "No such file or directory",
+      "Unable to locate data; resetting to system partition: No such file or directory",
+      "create_symlink: from /var/db/timezone/zoneinfo to /usr/share/zoneinfo.default: "
+      "No such file or directory",
+      "localtime link invalid; resetting to America/Los_Angeles: No such file or directory",
+      "create_symlink: from /var/db/timezone/localtime to "
+      "/var/db/timezone/zoneinfo/America/Los_Angeles: No such file or directory"},
+     "-/var/db/icutz"},
     {"icu_file", settled + "/var/db/icu=", {}, "-/var/db/icu"},
     {"icu_link", settled + "/var/db/icu>/usr", {}, "-/var/db/icu"},
     {"icu_empty_directory", settled + "/var/db/icu/", {}, "-/var/db/icu"},

@@ -1,4 +1,9 @@
+#include <cerrno>
+
+#include "fs/report.h"
+#include "startup/dataset_links.h"
 #include "startup/localtime.h"
+#include "startup/select_dataset.h"
 #include "startup/storage.h"
 
 namespace {
@@ -12,12 +17,24 @@ void attempt(void (*stage)()) noexcept {
   }
 }
 
+/// Selects the active dataset, and falls back to the system copy whatever goes wrong. By then
+/// everything that the selection held has been released.
+void select_dataset_or_reset() {
+  try {
+    select_dataset();
+  } catch (...) {
+    fs::report(errno, "Unable to locate data; resetting to system partition");
+    reset_to_system();
+  }
+}
+
 }  // namespace
 
 int main(int /*count*/, char** /*arguments*/) {
   attempt(prepare_storage);
   attempt(migrate_legacy_icutz);
   attempt(remove_legacy_icu);
+  attempt(select_dataset_or_reset);
   attempt(repair_localtime_link);
   return 0;
 }
