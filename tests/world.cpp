@@ -66,8 +66,8 @@ std::map<std::string, found> snapshot() {
       const auto status = item.symlink_status();
       struct stat details {};
       ::lstat(path.c_str(), &details);
-      all[path] = {files::is_symlink(status)        ? ">" + files::read_symlink(path).string()
-                   : files::is_regular_file(status) ? "=" + content_of(path)
+      all[path] = {files::is_symlink(status) ? std::string(">").append(files::read_symlink(path))
+                   : files::is_regular_file(status) ? std::string("=").append(content_of(path))
                    : files::is_directory(status)    ? "/"
                                                     : "|",
                    details.st_ino};
