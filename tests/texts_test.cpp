@@ -1,0 +1,111 @@
+#include <gtest/gtest.h>
+
+#include <fstream>
+#include <random>
+#include <regex>
+
+#include "dataset/vela_icu.h"
+#include "dataset/vela_version.h"
+#include "dataset/vela_zoneinfo.h"
+#include "fs/file.h"
+#include "startup/dataset_links.h"
+
+namespace {
+
+vela_version parsed(const std::string& text) {
+  vela_version version = {1, "kept", 2, 3};
+  version.parse(text);
+  return version;
+}
+
+TEST(Texts, Versions) {
+  EXPECT_EQ(parsed("2022a"), (vela_version{2022, "a", -1, -1}));
+  EXPECT_EQ(parsed("02022ab.010"), (vela_version{2022, "ab", 10, -1}));
+  EXPECT_EQ(parsed("2147483647z.0.20"), (vela_version{2147483647, "z", 0, 20}));
+  for (const std::string text : {"", ".1.0", "2022", "a", "2022A", "2022a.", "2022a..1", "2022a/",
+                                 "2022a.1.0.1", "2022a.b", " 2022a", "2022a\n", "-2022a"}) {
+    EXPECT_EQ(parsed(text), vela_version()) << text;
+  }
+  vela_version version;
+  EXPECT_THROW(version.parse("2147483648a"), std::out_of_range);
+  EXPECT_THROW(version.parse("2022b.7.4294967296"), std::out_of_range);
+  EXPECT_EQ(version, (vela_version{2022, "b", 7, -1}));
+}
+
+TEST(Texts, VersionOrder) {
+  const char* const ascending[] = {"none",    "999z",      "2022a",     "2022a.0", "2022a.0.0",
+                                   "2022a.1", "2022a.1.0", "2022a.1.1", "2022a.9", "2022a.10",
+                                   "2022ab",  "2022z",     "2022za",    "2022zz",  "2023a"};
+  for (const auto& a : ascending) {
+    for (const auto& b : ascending) EXPECT_EQ(parsed(a) > parsed(b), &a > &b) << a << " > " << b;
+  }
+}
+
+/// The patterns that the scanners stand for decide about random texts of the bytes that matter.
+TEST(Texts, ScannersAgreeWithTheirPatterns) {
+  const std::regex version_pattern(R"(([0-9]+)([a-z]+)(?:\.([0-9]+))?(?:\.([0-9]+))?)");
+  const std::regex data_file_pattern(R"(icutz([0-9]+[lbe])\.dat)");
+  std::mt19937 random(2022);
+  const auto text_of = [&random](const std::string& alphabet) {
+    std::string text(random() % 9, '\0');
+    for (char& byte : text) byte = alphabet[random() % alphabet.size()];
+    return text;
+  };
+  for (int round = 0; round < 30000; ++round) {
+    const std::string text = text_of("0199az.././:`{");
+    std::smatch match;
+    const bool accepted = std::regex_match(text, match, version_pattern);
+    const auto number = [&](int group) {
+      return match[group].matched ? std::stoi(match[group]) : -1;
+    };
+    ASSERT_EQ(parsed(text),
+              accepted ? (vela_version{number(1), match[2], number(3), number(4)}) : vela_version())
+        << text;
+    const std::string name = (round % 8 != 0 ? "icutz" : "icuz") + text_of("0199lbe/:.d") +
+                             (round % 9 != 0 ? ".dat" : ".dat.bak");
+    const bool named = std::regex_match(name, match, data_file_pattern);
+    ASSERT_EQ(data_file_schema(name), named ? match.str(1) : "") << name;
+  }
+}
+
+TEST(Texts, DatasetPathsOfLinks) {
+  const std::string all = "/var/db/timezone/tz/";
+  const std::pair<const char*, const char*> good[] = {
+      {"2022a.1.0/zoneinfo", "2022a.1.0"},   {"2022a/other", "2022a"}, {"a/b/zoneinfo", "a/b"},
+      {"2022a/zoneinfo/", "2022a/zoneinfo"}, {"/a/zoneinfo", "/a"},    {"a/", "a"}};
+  for (const auto& [target, path] : good) {
+    EXPECT_EQ(dataset_path_from_link(all + target), all + path);
+  }
+  EXPECT_EQ(dataset_path_from_link("/usr/share/zoneinfo.default"), "");
+  for (const std::string& bad : {std::string(), all, all + "2022a", all + "/zoneinfo", all + "/",
+                                 all.substr(1) + "a/zoneinfo", std::string("/usr/share/zoneinfo"),
+                                 std::string("/usr/share/zoneinfo.default/")}) {
+    EXPECT_THROW(static_cast<void>(dataset_path_from_link(bad)), int) << bad;
+  }
+}
+
+TEST(Texts, FirstWords) {
+  const std::pair<std::string, std::string> table[] = {
+      {"", ""},
+      {" \t\n\v\f\r", ""},
+      {"2022a", "2022a"},
+      {"\n2022a and more", "2022a"},
+      {"2022a\v", "2022a"},
+      {std::string("a\0b c", 5), std::string("a\0b", 3)},
+      {std::string(10000, '\n') + std::string(300000, '7') + " x", std::string(300000, '7')},
+      {std::string(4095, ' ') + "ab c", "ab"},
+      {std::string(4096, 'a') + " c", std::string(4096, 'a')},
+  };
+  for (const auto& [content, word] : table) {
+    std::ofstream("/var/tmp/file", std::ios::binary) << content;
+    EXPECT_EQ(fs::read_first_word("/var/tmp/file"), word) << content.size() << " bytes";
+  }
+  EXPECT_EQ(fs::read_first_word("/dev/zero"), "");
+}
+
+TEST(Components, OnlyZoneinfoServesInAnyPlace) {
+  EXPECT_TRUE(vela_zoneinfo().compatible_schema(vela_icu()));
+  EXPECT_FALSE(vela_icu().compatible_schema(vela_zoneinfo()));
+}
+
+}  // namespace

@@ -1,0 +1,149 @@
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <sys/statfs.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <iostream>
+#include <map>
+#include <regex>
+#include <sstream>
+
+namespace files = std::filesystem;
+
+namespace {
+
+/// A scene of worlds.txt, definitions filled in.
+struct scene {
+  std::string name, before, changes, says;
+};
+
+void PrintTo(const scene& told, std::ostream* out) {
+  *out << told.name;
+}
+
+std::vector<scene> read_scenes() {
+  std::map<std::string, std::string> definitions;
+  std::vector<scene> scenes;
+  std::ifstream file(WORLDS);
+  for (std::string line; std::getline(file, line);) {
+    if (line.starts_with('#')) continue;
+    std::smatch part;
+    std::string name;
+    if (std::regex_search(line, part, std::regex(R"(^(\$\w+) )"))) {
+      name = part[1];
+      line.erase(0, name.size() + 1);
+    }
+    while (std::regex_search(line, part, std::regex(R"(\$\w+)"))) {
+      line.replace(part.position(), part.length(), definitions.at(part.str()));
+    }
+    if (!name.empty()) {
+      definitions[name] = line;
+    } else if (line.starts_with("    ")) {
+      const std::string lines =
+          std::regex_replace(line.substr(4), std::regex(" / "), "\nkestrel: ");
+      scenes.back().says = "kestrel: " + lines + "\n";
+    } else if (std::regex_match(line, part, std::regex(R"((\w+): (.*?)(?: => (.*))?)"))) {
+      scenes.push_back({part[1], part[2], part[3], ""});
+    }
+  }
+  return scenes;
+}
+
+/// What stands at a path: the sign of its kind and its content, ">/usr" for a link.
+using entry = std::pair<std::string, std::string>;
+
+std::vector<entry> entries_of(const std::string& told) {
+  std::vector<entry> entries;
+  std::istringstream words(told);
+  for (std::string word; words >> word;) {
+    const bool gone = word.starts_with('-');
+    const std::size_t sign =
+        std::min(word.find_first_of(">=|%"), word.ends_with('/') ? word.size() - 1 : word.size());
+    std::string path = word.substr(gone ? 1 : 0, sign);
+    std::string what = gone ? "-" : word.substr(sign);
+    if (!path.starts_with('/')) path.insert(0, "/var/db/timezone/");
+    if (what.starts_with(">~")) what.replace(1, 1, "/var/db/timezone");
+    entries.emplace_back(path, what);
+  }
+  return entries;
+}
+
+void make_world(const std::string& told) {
+  for (const char* top : {"/var/db", "/usr/share"}) {
+    for (const auto& item : files::directory_iterator(top)) files::remove_all(item.path());
+  }
+  for (const auto& [path, what] : entries_of(told)) {
+    const std::string content = what.substr(1);
+    files::create_directories(what == "/" ? files::path(path) : files::path(path).parent_path());
+    if (what[0] == '>') files::create_symlink(content, path);
+    if (what[0] == '=') std::ofstream(path) << content;
+    if (what[0] == '|') ::mkfifo(path.c_str(), 0600);
+    if (what[0] == '%') files::permissions(path, files::perms(std::stoi(content, nullptr, 8)));
+  }
+}
+
+/// All entries with their content and inode.
+std::map<std::string, std::string> snapshot() {
+  std::map<std::string, std::string> all;
+  for (const char* top : {"/var/db", "/usr/share"}) {
+    for (const auto& item : files::recursive_directory_iterator(top)) {
+      std::ostringstream what;
+      if (item.is_symlink()) {
+        what << '>' << files::read_symlink(item).string();
+      } else if (item.is_regular_file()) {
+        what << '=' << std::ifstream(item.path()).rdbuf();
+      } else {
+        what << (item.is_directory() ? '/' : '|');
+      }
+      struct stat status {};
+      ::lstat(item.path().c_str(), &status);
+      what.clear();  // an empty file's buffer marks the stream as failed
+      what << " inode " << status.st_ino;
+      all[item.path()] = what.str();
+    }
+  }
+  return all;
+}
+
+class Worlds : public testing::TestWithParam<scene> {};
+
+TEST_P(Worlds, SaysAndLeaves) {
+  const auto& [name, before, changes, says] = GetParam();
+  make_world(before);
+  auto expected = snapshot();
+  const bool powerless = before.find('%') != std::string::npos && ::geteuid() == 0;
+  const std::string command = powerless ? "setpriv --bounding-set=-all " KESTREL : KESTREL;
+  EXPECT_EQ(std::system((command + " 2>/var/tmp/said").c_str()), 0);
+  std::ostringstream said;
+  said << std::ifstream("/var/tmp/said").rdbuf();
+  EXPECT_EQ(said.str(), says);
+  auto after = snapshot();
+  for (const auto& [path, what] : entries_of(changes)) {
+    expected.erase(path);
+    if (what == "-") continue;
+    expected[path] = what;
+    after[path].erase(after[path].find(" inode "));
+  }
+  EXPECT_EQ(after, expected);
+}
+
+INSTANTIATE_TEST_SUITE_P(Told, Worlds, testing::ValuesIn(read_scenes()),
+                         [](const auto& tested) { return tested.param.name; });
+
+}  // namespace
+
+int main(int count, char** arguments) {
+  struct statfs var {};
+  constexpr auto in_memory = 0x01021994;
+  if (!files::exists("/var/private-world") || ::statfs("/var", &var) != 0 ||
+      var.f_type != in_memory) {
+    std::cerr << "These tests rewrite /var/db and /usr/share: run scripts/test.\n";
+    return 1;
+  }
+  testing::InitGoogleTest(&count, arguments);
+  return RUN_ALL_TESTS();
+}
