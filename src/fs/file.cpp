@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cstddef>
 #include <new>
 
 #include "fs/descriptor.h"
@@ -30,11 +31,12 @@ bool is_blank(char byte) noexcept {
 
 /// The first word read from an open descriptor; may throw std::bad_alloc.
 std::string first_word(int file) {
+  constexpr std::size_t most = std::size_t{64} << 20;
   std::string word;
   std::array<char, 4096> block;
-  for (;;) {
+  for (std::size_t total = 0; total < most; total += block.size()) {
     const ssize_t count = ::read(file, block.data(), block.size());
-    if (count < 0) return {};
+    if (count < 0) break;
     if (count == 0) return word;
     const char* begin = block.data();
     const char* const end = begin + count;
@@ -43,6 +45,7 @@ std::string first_word(int file) {
     word.append(begin, word_end);
     if (word_end != end) return word;
   }
+  return {};
 }
 
 }  // namespace

@@ -10,9 +10,10 @@
 namespace fs {
 
 /// The first word of the file at `path`: the bytes (NULs included) between leading white space of
-/// the C locale and the next white space or the end of the file; of any length.
+/// the C locale and the next white space or the end of the file.
 /// Empty when the file is missing, not regular, cannot be read to the word's end, holds nothing
-/// but white space, or holds a word for which there is no memory. Prints and throws nothing.
+/// but white space, or when the word does not end within 64 MiB or the memory there is: a file of
+/// holes must not cost a boot. Prints and throws nothing.
 [[nodiscard]] std::string read_first_word(const char* path) noexcept;
 
 /// Makes the file at `path` hold exactly `texts` (nine at most), one after the other; a new file

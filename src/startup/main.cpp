@@ -3,6 +3,7 @@
 #include "fs/report.h"
 #include "startup/dataset_links.h"
 #include "startup/localtime.h"
+#include "startup/process.h"
 #include "startup/select_dataset.h"
 #include "startup/storage.h"
 
@@ -31,6 +32,7 @@ void select_dataset_or_reset() {
 }  // namespace
 
 int main(int /*count*/, char** /*arguments*/) {
+  guard_process();
   attempt(prepare_storage);
   attempt(migrate_legacy_icutz);
   attempt(remove_legacy_icu);
