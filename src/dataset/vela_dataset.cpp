@@ -33,10 +33,9 @@ void vela_dataset::create_components() {
 }
 
 bool vela_dataset::compatible_schema(const vela_dataset& other) const {
-  return std::equal(
-      components.begin(), components.end(),  //
-      other.components.begin(), other.components.end(),
-      [](const auto& mine, const auto& theirs) { return mine->compatible_schema(*theirs); });
+  return std::ranges::equal(components, other.components, [](const auto& mine, const auto& theirs) {
+    return mine->compatible_schema(*theirs);
+  });
 }
 
 void vela_dataset::activate() const {

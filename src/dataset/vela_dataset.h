@@ -11,15 +11,12 @@
 /// its version under "/var/db/timezone/tz/". Built whole by its constructor and never changed.
 class vela_dataset {
  public:
-  /// The system copy, the same as from an empty path.
-  vela_dataset() : vela_dataset(std::string()) {}
-
   /// The download in the directory `dataset_path`, or the system copy for the empty path. A version
   /// text that does not parse gives the unknown version (and `vela_version::parse`'s messages).
-  /// A path that does not lie under the directory of downloads prints
-  /// "vela_dataset::create_components: bad path %s" and throws std::invalid_argument. Throws also
-  /// what parsing the version and constructing the components throw.
-  explicit vela_dataset(std::string dataset_path);
+  /// A path that does not begin with "/var/db/timezone/tz/" and at least one byte more prints
+  /// "vela_dataset::create_components: bad path %s" and throws std::invalid_argument (errno 0).
+  /// Throws also what parsing the version and constructing the components throw.
+  explicit vela_dataset(std::string dataset_path = {});
 
   /// Whether both lie in the same place.
   bool operator==(const vela_dataset& other) const { return path == other.path; }
@@ -35,8 +32,8 @@ class vela_dataset {
   /// throws ends it; those before it stay active.
   void activate() const;
 
-  /// The text that the version was parsed from: a download's directory name, or the first word of
-  /// the system copy's "+VERSION" followed by ".1.0".
+  /// The text that the version was parsed from: what follows "/var/db/timezone/tz/" in a download's
+  /// path, or the first word of the system copy's "+VERSION" followed by ".1.0".
   [[nodiscard]] const std::string& get_version_string() const { return version_string; }
 
  private:

@@ -6,13 +6,10 @@
 /// One kind of time-zone data of one dataset, and the link through which the system reads it.
 ///
 /// A component knows all about its files when it is constructed and never changes. It is held by
-/// a shared pointer made from a pointer to its concrete class, which destroys it as that class:
-/// hence no virtual destructor, and none that could be reached through this class.
+/// a shared pointer made from a pointer to its concrete class, which destroys it as that class;
+/// the protected destructor keeps anyone from deleting it through this one.
 class vela_dataset_component {
  public:
-  vela_dataset_component(const vela_dataset_component&) = delete;
-  vela_dataset_component& operator=(const vela_dataset_component&) = delete;
-
   /// Whether `other` can serve in this component's place.
   [[nodiscard]] virtual bool compatible_schema(const vela_dataset_component& other) const = 0;
 
@@ -21,8 +18,7 @@ class vela_dataset_component {
   virtual void activate() const = 0;
 
  protected:
-  vela_dataset_component() = default;
-  explicit vela_dataset_component(std::string path) : dataset_path(std::move(path)) {}
+  explicit vela_dataset_component(std::string path = {}) : dataset_path(std::move(path)) {}
   ~vela_dataset_component() = default;
 
   /// The directory of the download that this is a part of; empty for the system copy.

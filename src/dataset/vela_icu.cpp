@@ -15,18 +15,35 @@
 
 namespace {
 
-struct close_walk {
-  void operator()(FTS* walk) const {
-    const int saved_errno = errno;
-    ::fts_close(walk);
-    errno = saved_errno;
-  }
-};
-
 /// A file directly inside the walk's root that everyone may read.
 bool is_public_file(const FTSENT& entry) {
   return entry.fts_errno == 0 && entry.fts_level == 1 && entry.fts_namelen != 0 &&
          entry.fts_info == FTS_F && (entry.fts_statp->st_mode & S_IROTH) != 0;
+}
+
+/// The schema of the first data file in a download's directory; empty where there is none.
+std::string find_schema(std::string directory) {
+  const std::array<char*, 2> roots = {directory.data(), nullptr};
+  const std::unique_ptr<FTS, decltype(&::fts_close)> walk(
+      ::fts_open(roots.data(), FTS_COMFOLLOW | FTS_PHYSICAL | FTS_XDEV, nullptr), ::fts_close);
+  if (!walk) {
+    const int error = errno;
+    fs::report(error, "tz_icu::initialize: fts_open of %s failed, %s",
+               {directory.c_str(), std::strerror(error)});
+    throw int{error};
+  }
+  std::string_view schema;
+  while (schema.empty()) {
+    FTSENT* const entry = ::fts_read(walk.get());
+    if (entry == nullptr) break;
+    if (is_public_file(*entry)) {
+      schema = data_file_schema({entry->fts_name, entry->fts_namelen});
+    } else if (entry->fts_info == FTS_D && entry->fts_level > 0) {
+      // What lies below never counts, and going down costs with its size and depth.
+      ::fts_set(walk.get(), entry, FTS_SKIP);
+    }
+  }
+  return std::string(schema);
 }
 
 }  // namespace
@@ -54,30 +71,8 @@ void vela_icu::initialize() {
     schema = fs::read_first_word((icu_path + "/icutzformat.txt").c_str());
     return;
   }
-  find_data_file();
+  schema = find_schema(icu_path);
   if (schema.empty()) fs::report(0, "No ICU schema found for %s", {dataset_path.c_str()});
-}
-
-void vela_icu::find_data_file() {
-  const std::array<char*, 2> roots = {icu_path.data(), nullptr};
-  const std::unique_ptr<FTS, close_walk> walk(
-      ::fts_open(roots.data(), FTS_COMFOLLOW | FTS_PHYSICAL | FTS_XDEV, nullptr));
-  if (!walk) {
-    const int error = errno;
-    fs::report(error, "tz_icu::initialize: fts_open of %s failed, %s",
-               {icu_path.c_str(), std::strerror(error)});
-    throw int{error};
-  }
-  while (schema.empty()) {
-    FTSENT* const entry = ::fts_read(walk.get());
-    if (entry == nullptr) return;
-    if (is_public_file(*entry)) {
-      schema = data_file_schema({entry->fts_name, entry->fts_namelen});
-    } else if (entry->fts_info == FTS_D && entry->fts_level > 0) {
-      // What lies below never counts, and going down costs with its size and depth.
-      ::fts_set(walk.get(), entry, FTS_SKIP);
-    }
-  }
 }
 
 bool vela_icu::compatible_schema(const vela_dataset_component& other) const {

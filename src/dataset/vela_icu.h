@@ -9,12 +9,9 @@
 /// active when that link is absent.
 class vela_icu final : public vela_dataset_component {
  public:
-  /// The system copy's ICU data.
-  vela_icu() : vela_icu(std::string()) {}
-
   /// The ICU data "icutz" in the directory `path`, or the system copy's for the empty path.
   /// Throws what `initialize` throws.
-  explicit vela_icu(const std::string& path);
+  explicit vela_icu(const std::string& path = {});
 
   /// Whether `other` is ICU data of the same schema. Anything but ICU data prints
   /// "vela_icu::compatible_schema: could not dynamic_cast other component".
@@ -26,15 +23,12 @@ class vela_icu final : public vela_dataset_component {
   void activate() const override;
 
  private:
-  /// Finds the schema: the first word of the system copy's "icutzformat.txt", or the schema in the
-  /// name of the first data file that the walk over a download's directory meets. A download
-  /// without one prints "No ICU schema found for %s".
-  /// Prints "tz_icu::initialize: fts_open of %s failed, %s" and throws `int` when the walk cannot
-  /// be started.
+  /// Finds the schema: the first word of the system copy's "icutzformat.txt", or, for a download,
+  /// that in the name of the first data file met in its directory: a regular file, readable by
+  /// others. A download without one prints "No ICU schema found for %s", whatever the reason.
+  /// Prints "tz_icu::initialize: fts_open of %s failed, %s" and throws `int` when the walk over
+  /// the directory cannot be started.
   void initialize();
-
-  /// Walks a download's directory for `initialize`.
-  void find_data_file();
 
   std::string schema;
   std::string icu_path;

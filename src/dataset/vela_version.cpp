@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <cerrno>
 #include <charconv>
-#include <cstddef>
 #include <stdexcept>
 #include <string_view>
 #include <system_error>
@@ -12,14 +11,17 @@
 
 namespace {
 
-constexpr std::string_view digits = "0123456789";
-constexpr std::string_view lower_case = "abcdefghijklmnopqrstuvwxyz";
+bool is_digit(char byte) {
+  return byte >= '0' && byte <= '9';
+}
+bool is_lower_case(char byte) {
+  return byte >= 'a' && byte <= 'z';
+}
 
-/// Cuts the longest run of bytes out of `alphabet` off the front of `rest`; may be empty.
-std::string_view take_run(std::string_view& rest, std::string_view alphabet) {
-  const std::size_t length = std::min(rest.find_first_not_of(alphabet), rest.size());
-  const std::string_view run = rest.substr(0, length);
-  rest.remove_prefix(length);
+/// Cuts the longest run of bytes of one kind off the front of `rest`; may be empty.
+std::string_view take_run(std::string_view& rest, bool (*is_of_kind)(char)) {
+  const std::string_view run(rest.begin(), std::find_if_not(rest.begin(), rest.end(), is_of_kind));
+  rest.remove_prefix(run.size());
   return run;
 }
 
@@ -28,7 +30,7 @@ std::string_view take_run(std::string_view& rest, std::string_view alphabet) {
 std::string_view take_dotted_number(std::string_view& rest) {
   if (!rest.starts_with('.')) return {};
   std::string_view behind_dot = rest.substr(1);
-  const std::string_view number = take_run(behind_dot, digits);
+  const std::string_view number = take_run(behind_dot, is_digit);
   if (!number.empty()) rest = behind_dot;
   return number;
 }
@@ -49,8 +51,8 @@ std::int32_t to_number(std::string_view number) {
 // ([0-9]+)([a-z]+)(?:\.([0-9]+))?(?:\.([0-9]+))?
 void vela_version::parse(const std::string& text) {
   std::string_view rest = text;
-  const std::string_view year_digits = take_run(rest, digits);
-  const std::string_view letter_run = take_run(rest, lower_case);
+  const std::string_view year_digits = take_run(rest, is_digit);
+  const std::string_view letter_run = take_run(rest, is_lower_case);
   const std::string_view major_digits = take_dotted_number(rest);
   const std::string_view minor_digits = take_dotted_number(rest);
   if (year_digits.empty() || letter_run.empty() || !rest.empty()) {

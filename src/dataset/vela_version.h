@@ -16,7 +16,7 @@ struct vela_version {
   /// Overwrites the record with the version that `text` stands for.
   /// A text of another form prints "Cannot parse version string %s, results.size() = 0" and
   /// "Cannot parse version string %s", and leaves the unknown version.
-  /// Throws std::out_of_range, errno then ERANGE, when a number is above 2147483647; the fields
+  /// Throws std::out_of_range (errno ERANGE) when a number is above 2147483647; the fields
   /// before it keep their new values.
   void parse(const std::string& text);
 

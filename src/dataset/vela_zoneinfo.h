@@ -7,12 +7,9 @@
 /// A zoneinfo tree, made active by "/var/db/timezone/zoneinfo".
 class vela_zoneinfo final : public vela_dataset_component {
  public:
-  /// The system copy's tree.
-  vela_zoneinfo() : vela_zoneinfo(std::string()) {}
-
   /// The tree "zoneinfo" in the directory `path`, or the system copy's for the empty path. Reads
   /// the version text from the tree's "+VERSION"; a file that cannot be read gives an empty one.
-  explicit vela_zoneinfo(const std::string& path);
+  explicit vela_zoneinfo(const std::string& path = {});
 
   /// The first word of "+VERSION", of whatever form.
   [[nodiscard]] const std::string& get_version_text() const { return version_text; }

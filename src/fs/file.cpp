@@ -10,7 +10,6 @@
 #include <new>
 
 #include "fs/descriptor.h"
-#include "fs/gathered_text.h"
 
 namespace fs {
 namespace {
@@ -60,11 +59,10 @@ std::string read_first_word(const char* path) noexcept {
   }
 }
 
-void write_file(const char* path, std::initializer_list<std::string_view> texts) noexcept {
-  gathered_text content;
-  for (const std::string_view text : texts) content.append(text);
+void write_file(const char* path, std::string_view content) noexcept {
   const descriptor file = open_regular(path, O_WRONLY | O_CREAT | O_TRUNC);
-  if (file.is_open()) content.write_to(file.get());
+  if (!file.is_open()) return;
+  [[maybe_unused]] const ssize_t ignored = ::write(file.get(), content.data(), content.size());
 }
 
 }  // namespace fs

@@ -1,6 +1,5 @@
 #pragma once
 
-#include <initializer_list>
 #include <string>
 #include <string_view>
 
@@ -16,8 +15,8 @@ namespace fs {
 /// holes must not cost a boot. Prints and throws nothing.
 [[nodiscard]] std::string read_first_word(const char* path) noexcept;
 
-/// Makes the file at `path` hold exactly `texts` (nine at most), one after the other; a new file
-/// gets mode 0666 less the umask. Failures are ignored. Prints and throws nothing.
-void write_file(const char* path, std::initializer_list<std::string_view> texts) noexcept;
+/// Makes the file at `path` hold exactly `content`; a new file gets mode 0666 less the umask.
+/// Failures are ignored. Prints and throws nothing.
+void write_file(const char* path, std::string_view content) noexcept;
 
 }  // namespace fs

@@ -3,13 +3,9 @@
 #include <string>
 
 /// The file-system operations of the program. They turn a failed system call into a printed
-/// message followed by an exception, and take a missing entry for a normal outcome.
-///
-/// Paths and link contents are NUL-terminated byte strings, handed to the system call unchanged.
-///
-/// Every failure throws the call's error number as a plain `int`, after its message, and errno
-/// still holds that number when the exception arrives at its handler: a handler that adds a
-/// message of its own reports errno.
+/// message followed by an exception, a plain `int` with the call's error number, and take a
+/// missing entry for a normal outcome. Paths and link contents are NUL-terminated byte strings,
+/// handed to the system call unchanged.
 namespace fs {
 
 /// Removes the entry at `path`: a link itself, never what it points at; never a directory.
@@ -23,7 +19,8 @@ void remove(const char* path);
 
 /// The content of the link at `path`, as stored; no more than its first 1024 bytes.
 /// Empty when nothing exists at `path`.
-/// On failure (not a link, say) prints "read_symlink: %s" and throws `int`.
+/// On failure (not a link, say) prints "read_symlink: %s" and throws `int`; throws std::bad_alloc
+/// where there is no memory for the content.
 [[nodiscard]] std::string read_symlink(const char* path);
 
 /// Makes a link at `link` with the content `target`, which need not exist. Replaces nothing:

@@ -1,30 +1,36 @@
 #include "fs/report.h"
 
+#include <sys/uio.h>
 #include <unistd.h>
 
+#include <array>
 #include <cerrno>
 #include <cstddef>
 #include <cstring>
-
-#include "fs/gathered_text.h"
 
 namespace fs {
 
 void report(int error, std::string_view format, std::initializer_list<const char*> texts) noexcept {
   const int saved_errno = errno;
-  gathered_text line;
-  line.append("kestrel: ");
+  std::array<iovec, 9> pieces;
+  int count = 0;
+  const auto append = [&pieces, &count](std::string_view text) {
+    // writev(2) only reads, but its structure has no const form.
+    pieces[static_cast<std::size_t>(count++)] = {const_cast<char*>(text.data()), text.size()};
+  };
+
+  append("kestrel: ");
   for (const char* const text : texts) {
     const std::size_t place = format.find("%s");
-    line.append(format.substr(0, place));
-    line.append(text);
+    append(format.substr(0, place));
+    append(text);
     format.remove_prefix(place + 2);
   }
-  line.append(format);
-  line.append(": ");
-  line.append(std::strerror(error));
-  line.append("\n");
-  line.write_to(STDERR_FILENO);
+  append(format);
+  append(": ");
+  append(std::strerror(error));
+  append("\n");
+  [[maybe_unused]] const ssize_t ignored = ::writev(STDERR_FILENO, pieces.data(), count);
   errno = saved_errno;
 }
 

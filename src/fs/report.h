@@ -14,6 +14,9 @@ namespace fs {
 /// replaced by the next of `texts`, up to that text's first NUL byte; there are as many texts as
 /// "%s", at most two.
 ///
+/// A handler that adds a message to a failure finds the number in errno: everything in this
+/// program that throws leaves it there, 0 where no call failed.
+///
 /// Throws nothing, allocates nothing and leaves errno as it was; a write that fails is not
 /// reported anywhere.
 void report(int error, std::string_view format,

@@ -2,10 +2,10 @@
 
 #include <string>
 
-/// The links that name datasets, as dataset paths: the directory of a download, or the empty text
-/// for the system copy.
+// The links that name datasets. A dataset path is the directory of a download, or the empty text
+// for the system copy.
 
-/// The target of "/var/db/timezone/tz_latest" as it stands; empty when there is no such link.
+/// The target of "/var/db/timezone/tz_latest", not examined; empty when there is no such link.
 /// Throws what `fs::read_symlink` throws.
 [[nodiscard]] std::string latest_dataset_path();
 

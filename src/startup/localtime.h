@@ -1,8 +1,9 @@
 #pragma once
 
-/// Leaves "/var/db/timezone/localtime" in one of three states: unchanged when it points into the
-/// active zoneinfo tree, rewritten when it points into the old one ("/usr/share/zoneinfo") and the
-/// active tree has the zone, else pointing at America/Los_Angeles.
+/// Leaves "/var/db/timezone/localtime" in one of three states: unchanged when its content begins
+/// with "/var/db/timezone/zoneinfo", whether or not the zone exists; with that in the place of a
+/// leading "/usr/share/zoneinfo" when what it then names exists; else pointing at
+/// America/Los_Angeles.
 ///
 /// Prints "Correcting localtime link to %s" before a rewrite is tried and
 /// "localtime link invalid; resetting to %s" before a reset. Throws `int` when even the default

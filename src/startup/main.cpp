@@ -9,8 +9,8 @@
 
 namespace {
 
-/// Runs one stage. Nothing that leaves it ends the run: it has been reported where it arose, there
-/// is no further fallback, and the stages behind it still do their work.
+/// Runs one stage. Nothing that leaves it ends the run: a failed call has been reported where it
+/// arose, there is no further fallback, and the stages behind it still do their work.
 void attempt(void (*stage)()) noexcept {
   try {
     stage();

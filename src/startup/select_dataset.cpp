@@ -11,9 +11,9 @@
 
 namespace {
 
-/// The current dataset's path; that of the system copy, after a reset to it, where the active link
-/// does not tell.
-std::string settled_current_path() {
+/// The current dataset's path. Where the active link does not tell, resets to the system copy and
+/// gives that one's.
+std::string current_path_or_reset() {
   try {
     return current_dataset_path();
   } catch (...) {
@@ -28,7 +28,7 @@ std::string settled_current_path() {
 void select_dataset() {
   const vela_dataset system;
   const std::string latest_path = latest_dataset_path();
-  const vela_dataset current(settled_current_path());
+  const vela_dataset current(current_path_or_reset());
 
   const vela_dataset* baseline = &current;
   if (!current.compatible_schema(system) || system > current) {
@@ -42,9 +42,10 @@ void select_dataset() {
   // Against the current dataset, not the baseline: a download older than the system copy still
   // replaces an even older one.
   if (latest.compatible_schema(system) && latest > current) {
+    // Made first: once the download is active, nothing may fail but the writing.
+    const std::string record = baseline->get_version_string() + "_" + latest.get_version_string();
     latest.activate();
-    fs::write_file(paths::record,
-                   {baseline->get_version_string(), "_", latest.get_version_string()});
+    fs::write_file(paths::record, record);
   } else {
     fs::report(0, "New update not compatible or older version: %s vs. %s",
                {latest.get_version_string().c_str(), current.get_version_string().c_str()});

@@ -10,10 +10,7 @@
 #include "fs/report.h"
 #include "paths.h"
 
-void prepare_storage() {
-  mark_unprotected(paths::storage);
-  mark_unprotected(paths::downloads);
-}
+namespace {
 
 void mark_unprotected(const char* path) noexcept {
   constexpr int set_protection_class = 64;
@@ -22,6 +19,13 @@ void mark_unprotected(const char* path) noexcept {
   if (directory.is_open()) {
     ::fcntl(directory.get(), set_protection_class, class_without_protection);
   }
+}
+
+}  // namespace
+
+void prepare_storage() {
+  mark_unprotected(paths::storage);
+  mark_unprotected(paths::downloads);
 }
 
 void migrate_legacy_icutz() {

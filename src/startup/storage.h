@@ -1,15 +1,12 @@
 #pragma once
 
-/// The stages that put the storage in order before any dataset is looked at. Each prints nothing
-/// when all goes well, and lets no file-system failure out.
+// The stages that put the storage in order before any dataset is looked at. Each prints nothing
+// when all goes well, and lets no file-system failure out.
 
 /// Gives "/var/db/timezone/" and "/var/db/timezone/tz/" the data-protection class without
-/// protection. A directory that cannot be opened is passed over.
+/// protection, on platforms that have such classes; others refuse the request, and nothing comes of
+/// it. A directory that cannot be opened is passed over.
 void prepare_storage();
-
-/// Gives the directory at `path` protection class 4, on platforms that have such classes; others
-/// refuse the request, and nothing comes of it. Prints and throws nothing.
-void mark_unprotected(const char* path) noexcept;
 
 /// Copies the legacy link "/var/db/icutz" to "/var/db/timezone/icutz" when only the legacy one
 /// exists (links followed), then removes the legacy one whatever became of the copy.
