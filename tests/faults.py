@@ -9,7 +9,7 @@ import time
 from collections import Counter
 from pathlib import Path
 
-# Worlds are told as in world.h.
+# Entries are told as in worlds.txt: links and files only, and "~" ends in a slash.
 STORAGE, A, B = "/var/db/timezone/", "2022b.1.0", "2022b.2.0"
 SYSTEM = ("/usr/share/zoneinfo.default/+VERSION=2022a /usr/share/zoneinfo.default/Asia/Tokyo=TZif "
           "/usr/share/icu/icutzformat.txt=44l ")
