@@ -18,33 +18,30 @@ void require(bool holds) {
   if (!holds) std::abort();  // the fuzzer shows the stack, and so the check
 }
 
-/// A version and whether a number was out of range.
-using outcome = std::pair<vela_version, bool>;
-
-outcome parsed(const std::string& text) {
-  outcome result;
-  try {
-    result.first.parse(text);
-  } catch (const std::out_of_range&) {
-    result.second = true;
-  }
-  return result;
+vela_version parsed_by_pattern(const std::string& text) {
+  static const std::regex pattern(R"(([0-9]+)([a-z]+)(?:\.([0-9]+))?(?:\.([0-9]+))?)");
+  std::smatch match;
+  if (!std::regex_match(text, match, pattern)) return {};
+  const auto number = [&](int group) {
+    return match[group].matched ? std::stoi(match[group]) : -1;
+  };
+  return {number(1), match[2], number(3), number(4)};
 }
 
-outcome parsed_by_pattern(const std::string& text) {
-  static const std::regex pattern(R"(([0-9]+)([a-z]+)(?:\.([0-9]+))?(?:\.([0-9]+))?)");
-  outcome result;
-  std::smatch match;
-  if (!std::regex_match(text, match, pattern)) return result;
+/// The version that a parser makes of a text, and whether a number was out of range.
+template <typename Parser>
+std::pair<vela_version, bool> outcome(Parser parse) {
   try {
-    result.first.year = std::stoi(match.str(1));
-    result.first.letters = match.str(2);
-    if (match[3].matched) result.first.major = std::stoi(match.str(3));
-    if (match[4].matched) result.first.minor = std::stoi(match.str(4));
+    return {parse(), false};
   } catch (const std::out_of_range&) {
-    result.second = true;
+    return {{}, true};
   }
-  return result;
+}
+
+vela_version parsed(const std::string& text) {
+  vela_version version;
+  version.parse(text);
+  return version;
 }
 
 void check_data_file(const std::string& name) {
@@ -59,7 +56,7 @@ void check_order(std::istringstream words) {
   std::string word;
   vela_version versions[3];
   for (auto& version : versions) {
-    if (words >> word) version = parsed(word).first;
+    if (words >> word) version = outcome([&] { return parsed(word); }).first;
   }
   for (const auto& a : versions) {
     for (const auto& b : versions) {
@@ -100,7 +97,8 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   const std::string text(data, data + size);
   // std::regex recurses once per character, and is slow.
   if (size < 200) {
-    require(parsed(text) == parsed_by_pattern(text));
+    require(outcome([&] { return parsed(text); }) ==
+            outcome([&] { return parsed_by_pattern(text); }));
     check_data_file(text);
     check_data_file("icutz" + text + ".dat");
   }

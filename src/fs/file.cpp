@@ -6,7 +6,6 @@
 
 #include <algorithm>
 #include <array>
-#include <cstddef>
 #include <new>
 
 #include "fs/descriptor.h"
@@ -30,13 +29,14 @@ bool is_blank(char byte) noexcept {
 
 /// The first word read from an open descriptor; may throw std::bad_alloc.
 std::string first_word(int file) {
-  constexpr std::size_t most = std::size_t{64} << 20;
+  constexpr ssize_t limit = 64 * 1024 * 1024;
   std::string word;
   std::array<char, 4096> block;
-  for (std::size_t total = 0; total < most; total += block.size()) {
+  for (ssize_t total = 0; total < limit;) {
     const ssize_t count = ::read(file, block.data(), block.size());
     if (count < 0) break;
     if (count == 0) return word;
+    total += count;
     const char* begin = block.data();
     const char* const end = begin + count;
     if (word.empty()) begin = std::find_if_not(begin, end, is_blank);
