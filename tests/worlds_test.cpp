@@ -29,22 +29,20 @@ std::vector<scene> read_scenes() {
   std::map<std::string, std::string> definitions;
   std::vector<scene> scenes;
   std::ifstream file(WORLDS);
-  for (std::string line; std::getline(file, line);) {
-    const std::string head = line.substr(0, line.find(' '));
-    std::string text = line.substr(head.size());
-    if (head == "#" || text.empty()) continue;
-    for (std::smatch use; std::regex_search(text, use, std::regex(R"(\$\w+)"));) {
-      text.replace(use.position(), use.length(), definitions.at(use.str()));
+  for (std::string line, more; std::getline(file, line);) {
+    while (file.peek() == ' ' && std::getline(file, more)) line += more.substr(3);
+    if (line.starts_with('#')) continue;
+    for (std::smatch use; std::regex_search(line, use, std::regex(R"(\$(\w+))"));) {
+      line.replace(use.position(), use.length(), definitions.at(use[1]));
     }
-    if (head.starts_with('$')) {
-      definitions[head] = text.substr(1);
-    } else if (head.ends_with(':')) {
-      const std::size_t end = std::min(text.find(" => "), text.size());
-      const std::string changes = end < text.size() ? text.substr(end + 4) : "";
-      scenes.push_back({head.substr(0, head.size() - 1), text.substr(0, end), changes, ""});
-    } else {
-      const std::string lines = std::regex_replace(text, std::regex(" / "), "\nkestrel: ");
-      scenes.back().says = "kestrel: " + lines.substr(lines.find_first_not_of(' ')) + "\n";
+    std::smatch part;
+    if (std::regex_match(line, part, std::regex("(\\w+) = (.*)"))) {
+      definitions[part[1]] = part[2];
+    } else if (std::regex_match(line, part,
+                                std::regex(R"((\w+): (.*?)(?: => (.*?))?(?: \| (.*))?)"))) {
+      std::string says = std::regex_replace(part.str(4), std::regex(" / "), "\nkestrel: ");
+      if (!says.empty()) says = "kestrel: " + says + "\n";
+      scenes.push_back({part[1], part[2], part[3], says});
     }
   }
   return scenes;
