@@ -3,14 +3,13 @@
 #include <fts.h>
 #include <sys/stat.h>
 
-#include <array>
 #include <cerrno>
 #include <cstring>
-#include <memory>
 
 #include "fs/file.h"
 #include "fs/operations.h"
 #include "fs/report.h"
+#include "fs/walk.h"
 #include "paths.h"
 
 namespace {
@@ -22,10 +21,8 @@ bool is_public_file(const FTSENT& entry) {
 }
 
 /// The schema of the first data file in a download's directory; empty where there is none.
-std::string find_schema(std::string directory) {
-  const std::array<char*, 2> roots = {directory.data(), nullptr};
-  const std::unique_ptr<FTS, decltype(&::fts_close)> walk(
-      ::fts_open(roots.data(), FTS_COMFOLLOW | FTS_PHYSICAL | FTS_XDEV, nullptr), ::fts_close);
+std::string find_schema(const std::string& directory) {
+  const fs::walk walk = fs::open_walk(directory);
   if (!walk) {
     const int error = errno;
     fs::report(error, "tz_icu::initialize: fts_open of %s failed, %s",
