@@ -29,9 +29,8 @@ vela_version parsed(const std::string& text) {
     const auto number = [](const std::ssub_match& group) {
       return group.matched ? std::stoi(group) : -1;
     };
-    if (std::regex_match(text, match, pattern)) {
+    if (std::regex_match(text, match, pattern))
       expected = {number(match[1]), match[2], number(match[3]), number(match[4])};
-    }
   } catch (const std::out_of_range&) {
     out_of_range = true;
   }

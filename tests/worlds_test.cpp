@@ -1,6 +1,5 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
-#include <sys/statfs.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -108,8 +107,8 @@ TEST_P(Worlds, SaysAndLeaves) {
   make_world(before);
   auto expected = snapshot();
   const bool powerless = before.find('%') != std::string::npos && ::geteuid() == 0;
-  const std::string command = powerless ? "setpriv --bounding-set=-all " KESTREL : KESTREL;
-  EXPECT_EQ(std::system((command + " 2>/var/tmp/said").c_str()), 0);
+  const std::string command = powerless ? "setpriv --bounding-set=-all " : "";
+  EXPECT_EQ(std::system((command + KESTREL " 2>/var/tmp/said").c_str()), 0);
   EXPECT_EQ(content_of("/var/tmp/said"), says);
   auto after = snapshot();
   for (const auto& [path, what] : entries_of(changes)) {
@@ -128,10 +127,7 @@ INSTANTIATE_TEST_SUITE_P(Told, Worlds, testing::ValuesIn(read_scenes()),
 
 /// Without arguments runs the tests; with a scene's name, for scripts/faults, makes its world.
 int main(int count, char** arguments) {
-  struct statfs var {};
-  constexpr auto in_memory = 0x01021994;
-  if (!files::exists("/var/private-world") || ::statfs("/var", &var) != 0 ||
-      var.f_type != in_memory) {
+  if (!files::exists("/var/private-world")) {
     std::cerr << "These tests rewrite /var/db and /usr/share: run scripts/test.\n";
     return 1;
   }
