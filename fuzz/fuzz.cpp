@@ -46,7 +46,7 @@ vela_version parsed(const std::string& text) {
 
 /// Exactly one of newer, older and equal holds, and newer is transitive.
 void check_order(const vela_version& a, const vela_version& b, const vela_version& c) {
-  require(int{a > b} + int{b > a} + int{a == b} == 1);
+  require(a == b ? !(a > b || b > a) : (a > b) != (b > a));
   require(!(a > b && b > c) || a > c);
 }
 

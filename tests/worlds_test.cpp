@@ -32,7 +32,7 @@ std::vector<scene> read_scenes() {
     while (file.peek() == ' ' && std::getline(file, more)) line += more.substr(3);
     if (line.starts_with('#')) continue;
     for (std::smatch use; std::regex_search(line, use, std::regex(R"(\$(\w+))"));) {
-      line.replace(use.position(), use.length(), definitions.at(use[1]));
+      line.replace(use[0].first, use[0].second, definitions.at(use[1]));
     }
     std::smatch part;
     if (std::regex_match(line, part, std::regex("(\\w+) = (.*)"))) {
@@ -40,7 +40,7 @@ std::vector<scene> read_scenes() {
     } else if (std::regex_match(line, part,
                                 std::regex(R"((\w+): (.*?)(?: => (.*?))?(?: \| (.*))?)"))) {
       std::string says = std::regex_replace(part.str(4), std::regex(" / "), "\nkestrel: ");
-      if (!says.empty()) says = "kestrel: " + says + "\n";
+      if (!says.empty()) says.insert(0, "kestrel: ").append("\n");
       scenes.push_back({part[1], part[2], part[3], says});
     }
   }

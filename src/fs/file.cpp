@@ -29,7 +29,7 @@ bool is_blank(char byte) noexcept {
 
 /// The first word read from an open descriptor; may throw std::bad_alloc.
 std::string first_word(int file) {
-  constexpr ssize_t limit = 64 * 1024 * 1024;
+  constexpr ssize_t limit = 64L << 20;
   std::string word;
   std::array<char, 4096> block;
   for (ssize_t total = 0; total < limit;) {
