@@ -18,6 +18,7 @@ void guard_process() noexcept {
     } while (taken >= 0 && taken < STDERR_FILENO);
   }
 
-  // Nothing has been half done then: a dataset allocates before it touches a link.
+  // Reached where memory is lacking even for an exception. What the run leaves then is one of the
+  // states that a killed run leaves, and the next one starts from it.
   std::set_terminate([] { ::_exit(0); });
 }
