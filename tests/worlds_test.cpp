@@ -108,7 +108,7 @@ TEST_P(Worlds, SaysAndLeaves) {
   auto expected = snapshot();
   const bool powerless = before.find('%') != std::string::npos && ::geteuid() == 0;
   const std::string command = powerless ? "setpriv --bounding-set=-all " : "";
-  EXPECT_EQ(std::system((command + KESTREL " 2>/var/tmp/said").c_str()), 0);
+  EXPECT_EQ(std::system((command + "'" KESTREL "' 2>/var/tmp/said").c_str()), 0);
   EXPECT_EQ(content_of("/var/tmp/said"), says);
   auto after = snapshot();
   for (const auto& [path, what] : entries_of(changes)) {
