@@ -21,8 +21,9 @@ inline constexpr const char* icu_link = "/var/db/timezone/icutz";
 // Names the newest download; set by whatever downloads.
 inline constexpr const char* latest_link = "/var/db/timezone/tz_latest";
 
-// Names the local zone's file, reached through `zoneinfo_link`.
+// Names the local zone's file, reached through `zoneinfo_link`; and what a reset makes of it.
 inline constexpr const char* localtime_link = "/var/db/timezone/localtime";
+inline constexpr const char* default_localtime = "/var/db/timezone/zoneinfo/America/Los_Angeles";
 
 // Tells which version the last switch came from and which it went to.
 inline constexpr const char* record = "/var/db/timezone/TZVersionDiffRecord";

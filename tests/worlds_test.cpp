@@ -134,7 +134,9 @@ int main(int count, char** arguments) {
   testing::InitGoogleTest(&count, arguments);
   if (count == 1) return RUN_ALL_TESTS();
   for (const scene& told : read_scenes()) {
-    if (told.name == arguments[1]) make_world(told.before);
+    if (told.name != arguments[1]) continue;
+    make_world(told.before);
+    return 0;
   }
-  return 0;
+  return 1;
 }

@@ -31,7 +31,7 @@ class vela_icu final : public vela_dataset_component {
   void initialize();
 
   std::string schema;
-  std::string icu_path;
+  const std::string icu_path;
 };
 
 /// The schema in the name of an ICU data file, 44l for icutz44l.dat; empty for any other name.

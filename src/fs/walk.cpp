@@ -4,12 +4,21 @@
 #include <cerrno>
 #include <csetjmp>
 #include <csignal>
+#include <cstdint>
 
 namespace fs {
 namespace {
 
 // NOLINTNEXTLINE(cppcoreguidelines-avoid-non-const-global-variables): a handler can see no other
-sigjmp_buf unchecked_allocation;
+sigjmp_buf after_fts_open;
+
+/// Leaves fts_open at a write through a null pointer; any other fault goes on to end the process.
+void leave_fts_open(int /*signal*/, siginfo_t* fault, void* /*context*/) {
+  constexpr std::uintptr_t first_page = 4096;
+  const auto address = reinterpret_cast<std::uintptr_t>(fault->si_addr);
+  if (fault->si_code == SEGV_MAPERR && address < first_page) ::siglongjmp(after_fts_open, 1);
+  static_cast<void>(std::signal(SIGSEGV, SIG_DFL));
+}
 
 }  // namespace
 
@@ -20,12 +29,12 @@ walk open_walk(std::string root) {
   const std::array<char*, 2> roots = {root.data(), nullptr};
   struct sigaction previous {};
   struct sigaction action {};
-  action.sa_handler = [](int) { ::siglongjmp(unchecked_allocation, 1); };
-  action.sa_flags = SA_NODEFER;
+  action.sa_sigaction = leave_fts_open;
+  action.sa_flags = SA_SIGINFO | SA_NODEFER;
   ::sigaction(SIGSEGV, &action, &previous);
 
   FTS* volatile opened = nullptr;
-  if (sigsetjmp(unchecked_allocation, 0) == 0) {
+  if (sigsetjmp(after_fts_open, 0) == 0) {
     opened = ::fts_open(roots.data(), FTS_COMFOLLOW | FTS_PHYSICAL | FTS_XDEV, nullptr);
   } else {
     errno = ENOMEM;

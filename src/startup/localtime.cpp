@@ -12,7 +12,6 @@
 namespace {
 
 constexpr const char* default_zone = "America/Los_Angeles";
-constexpr const char* default_target = "/var/db/timezone/zoneinfo/America/Los_Angeles";
 
 /// Puts a link in the place of whatever can be removed there: unlike `fs::remove`, the C library's
 /// remove(3) takes an empty directory away too, and is silent where it fails.
@@ -47,5 +46,5 @@ void repair_localtime_link() {
     // Reported where it was thrown; like a link that points nowhere, it ends in the reset.
   }
   fs::report(errno, "localtime link invalid; resetting to %s", {default_zone});
-  replace_localtime_link(default_target);
+  replace_localtime_link(paths::default_localtime);
 }

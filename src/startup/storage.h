@@ -9,7 +9,8 @@
 void prepare_storage();
 
 /// Copies the legacy link "/var/db/icutz" to "/var/db/timezone/icutz" when only the legacy one
-/// exists (links followed), then removes the legacy one whatever became of the copy.
+/// exists, then removes the legacy one whatever became of the copy. A link exists when its target
+/// does: one whose target is missing stays.
 /// Prints "Could not migrate /var/db/icutz to /var/db/timezone/icutz" and
 /// "Could not remove /var/db/icutz".
 void migrate_legacy_icutz();
