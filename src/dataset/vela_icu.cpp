@@ -1,46 +1,51 @@
 #include "dataset/vela_icu.h"
 
-#include <fts.h>
+#include <dirent.h>
+#include <fcntl.h>
 #include <sys/stat.h>
 
 #include <cerrno>
 #include <cstring>
+#include <memory>
 
 #include "fs/file.h"
 #include "fs/operations.h"
 #include "fs/report.h"
-#include "fs/walk.h"
 #include "paths.h"
 
 namespace {
 
-/// A file directly inside the walk's root that everyone may read.
-bool is_public_file(const FTSENT& entry) {
-  return entry.fts_errno == 0 && entry.fts_level == 1 && entry.fts_namelen != 0 &&
-         entry.fts_info == FTS_F && (entry.fts_statp->st_mode & S_IROTH) != 0;
+struct closes_directory {
+  void operator()(DIR* directory) const noexcept {
+    const int error = errno;
+    ::closedir(directory);
+    errno = error;
+  }
+};
+using open_directory = std::unique_ptr<DIR, closes_directory>;
+
+/// Whether an entry is itself a regular file that everyone may read.
+bool is_public_file(DIR* directory, const char* name) noexcept {
+  struct stat found {};
+  return ::fstatat(::dirfd(directory), name, &found, AT_SYMLINK_NOFOLLOW) == 0 &&
+         S_ISREG(found.st_mode) && (found.st_mode & S_IROTH) != 0;
 }
 
 /// The schema of the first data file in a download's directory; empty where there is none.
-std::string find_schema(const std::string& directory) {
-  const fs::walk walk = fs::open_walk(directory);
-  if (!walk) {
-    const int error = errno;
-    fs::report(error, "tz_icu::initialize: fts_open of %s failed, %s",
-               {directory.c_str(), std::strerror(error)});
-    throw int{error};
+std::string find_schema(const char* path) {
+  const open_directory directory(::opendir(path));
+  if (directory == nullptr) {
+    if (errno != ENOMEM) return {};
+    fs::report(ENOMEM, "tz_icu::initialize: fts_open of %s failed, %s",
+               {path, std::strerror(ENOMEM)});
+    throw int{ENOMEM};
   }
-  std::string_view schema;
-  while (schema.empty()) {
-    FTSENT* const entry = ::fts_read(walk.get());
-    if (entry == nullptr) break;
-    if (is_public_file(*entry)) {
-      schema = data_file_schema({entry->fts_name, entry->fts_namelen});
-    } else if (entry->fts_info == FTS_D && entry->fts_level > 0) {
-      // What lies below never counts, and going down costs with its size and depth.
-      ::fts_set(walk.get(), entry, FTS_SKIP);
-    }
+  while (const dirent* const entry = ::readdir(directory.get())) {
+    const std::string_view schema = data_file_schema(entry->d_name);
+    if (!schema.empty() && is_public_file(directory.get(), entry->d_name))
+      return std::string(schema);
   }
-  return std::string(schema);
+  return {};
 }
 
 }  // namespace
@@ -68,7 +73,7 @@ void vela_icu::initialize() {
     schema = fs::read_first_word((icu_path + "/icutzformat.txt").c_str());
     return;
   }
-  schema = find_schema(icu_path);
+  schema = find_schema(icu_path.c_str());
   if (schema.empty()) fs::report(0, "No ICU schema found for %s", {dataset_path.c_str()});
 }
 

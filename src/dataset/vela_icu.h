@@ -24,10 +24,10 @@ class vela_icu final : public vela_dataset_component {
 
  private:
   /// Finds the schema: the first word of the system copy's "icutzformat.txt", or, for a download,
-  /// that in the name of the first data file met in its directory: a regular file, readable by
+  /// that in the name of the first data file listed in its directory: a regular file, readable by
   /// others. A download without one prints "No ICU schema found for %s", whatever the reason.
-  /// Prints "tz_icu::initialize: fts_open of %s failed, %s" and throws `int` when the walk over
-  /// the directory cannot be started.
+  /// Prints "tz_icu::initialize: fts_open of %s failed, %s" and throws `int` where there is no
+  /// memory for reading the directory.
   void initialize();
 
   std::string schema;

@@ -10,12 +10,6 @@ void guard_process() noexcept {
   static_cast<void>(std::signal(SIGPIPE, SIG_IGN));
   static_cast<void>(std::signal(SIGXFSZ, SIG_IGN));
 
-  // A blocked fault kills at once, and `fs::open_walk` has to catch one.
-  sigset_t faults;
-  ::sigemptyset(&faults);
-  ::sigaddset(&faults, SIGSEGV);
-  ::sigprocmask(SIG_UNBLOCK, &faults, nullptr);
-
   if (::fcntl(STDERR_FILENO, F_GETFD) < 0) {
     // A directory takes the place of what is closed: writing to it fails, and "/" is always there.
     int taken = -1;
