@@ -17,6 +17,9 @@ namespace fs {
 /// A handler that adds a message to a failure finds the number in errno: everything in this
 /// program that throws leaves it there, 0 where no call failed.
 ///
+/// Never called while a file or a directory is open: in a process started without standard error
+/// it may have that number, and the line would land in it.
+///
 /// Throws nothing, allocates nothing and leaves errno as it was; a write that fails is not
 /// reported anywhere.
 void report(int error, std::string_view format,

@@ -1,9 +1,12 @@
+#include <unistd.h>
+
 #include <cerrno>
+#include <csignal>
+#include <exception>
 
 #include "fs/report.h"
 #include "startup/dataset_links.h"
 #include "startup/localtime.h"
-#include "startup/process.h"
 #include "startup/select_dataset.h"
 #include "startup/storage.h"
 
@@ -32,7 +35,12 @@ void select_dataset_or_reset() {
 }  // namespace
 
 int main(int /*count*/, char** /*arguments*/) {
-  guard_process();
+  // A closed pipe and a file-size limit are ordinary failed writes.
+  static_cast<void>(std::signal(SIGPIPE, SIG_IGN));
+  static_cast<void>(std::signal(SIGXFSZ, SIG_IGN));
+  // Reached where memory is lacking even for an exception; the next run starts from what is left.
+  std::set_terminate([] { ::_exit(0); });
+
   attempt(prepare_storage);
   attempt(migrate_legacy_icutz);
   attempt(remove_legacy_icu);
