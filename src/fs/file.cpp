@@ -60,7 +60,7 @@ std::string read_first_word(const char* path) noexcept {
 }
 
 void write_file(const char* path, std::string_view content) noexcept {
-  const descriptor file = open_regular(path, O_WRONLY | O_CREAT | O_TRUNC);
+  const descriptor file = open_regular(path, O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW);
   if (!file.is_open()) return;
   [[maybe_unused]] const ssize_t ignored = ::write(file.get(), content.data(), content.size());
 }

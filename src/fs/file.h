@@ -16,8 +16,9 @@ namespace fs {
 /// boot. Prints and throws nothing.
 [[nodiscard]] std::string read_first_word(const char* path) noexcept;
 
-/// Makes the file at `path` hold exactly `content`; a new file gets mode 0666 less the umask.
-/// Failures are ignored. Prints and throws nothing.
+/// Makes the file at `path` hold exactly `content`; a new file gets mode 0666 less the umask. A
+/// link at `path` is a failure: it could lead to a file of root's. Failures are ignored. Prints and
+/// throws nothing.
 void write_file(const char* path, std::string_view content) noexcept;
 
 }  // namespace fs
