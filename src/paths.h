@@ -25,6 +25,11 @@ inline constexpr const char* latest_link = "/var/db/timezone/tz_latest";
 inline constexpr const char* localtime_link = "/var/db/timezone/localtime";
 inline constexpr const char* default_localtime = "/var/db/timezone/zoneinfo/America/Los_Angeles";
 
+// The names under which new links are made, to be renamed over the old ones.
+inline constexpr const char* new_zoneinfo_link = "/var/db/timezone/zoneinfo.new";
+inline constexpr const char* new_icu_link = "/var/db/timezone/icutz.new";
+inline constexpr const char* new_localtime_link = "/var/db/timezone/localtime.new";
+
 // Tells which version the last switch came from and which it went to.
 inline constexpr const char* record = "/var/db/timezone/TZVersionDiffRecord";
 

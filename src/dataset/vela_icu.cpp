@@ -87,11 +87,15 @@ bool vela_icu::compatible_schema(const vela_dataset_component& other) const {
 }
 
 void vela_icu::activate() const {
+  const bool is_download = !dataset_path.empty();
+  const char* const data = icu_path.c_str();
+  const bool replaced =
+      is_download && fs::replace_symlink(data, paths::icu_link, paths::new_icu_link);
   try {
-    fs::remove(paths::icu_link);
+    if (!replaced) fs::remove(paths::icu_link);
     fs::remove(paths::legacy_icu_link);
   } catch (...) {
     fs::report(errno, "unlink of ICU softlink failed");
   }
-  if (!dataset_path.empty()) fs::create_symlink(icu_path.c_str(), paths::icu_link);
+  if (is_download && !replaced) fs::create_symlink(data, paths::icu_link);
 }

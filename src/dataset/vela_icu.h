@@ -17,9 +17,10 @@ class vela_icu final : public vela_dataset_component {
   /// "vela_icu::compatible_schema: could not dynamic_cast other component".
   [[nodiscard]] bool compatible_schema(const vela_dataset_component& other) const override;
 
-  /// Removes "/var/db/timezone/icutz" and the legacy "/var/db/icutz"; then, for a download, links
-  /// the former to this directory. Prints "unlink of ICU softlink failed" when a removal fails,
-  /// and goes on; throws `int` when the link cannot be created.
+  /// For a download, puts a link to this directory in the place of "/var/db/timezone/icutz", in one
+  /// step or else by a removal and a creation; for the system copy, removes it. Then removes the
+  /// legacy "/var/db/icutz". The first removal that fails is the last: prints
+  /// "unlink of ICU softlink failed" and goes on; throws `int` when the creation fails.
   void activate() const override;
 
  private:

@@ -12,15 +12,13 @@ vela_zoneinfo::vela_zoneinfo(const std::string& path)
       zoneinfo_path(path.empty() ? paths::system_zoneinfo : path + "/zoneinfo"),
       version_text(fs::read_first_word((zoneinfo_path + "/+VERSION").c_str())) {}
 
-bool vela_zoneinfo::compatible_schema(const vela_dataset_component& /*other*/) const {
-  return true;
-}
-
 void vela_zoneinfo::activate() const {
+  const char* const tree = zoneinfo_path.c_str();
+  if (fs::replace_symlink(tree, paths::zoneinfo_link, paths::new_zoneinfo_link)) return;
   try {
     fs::remove(paths::zoneinfo_link);
   } catch (...) {
     fs::report(errno, "Unlink of zoneinfo softlink failed");
   }
-  fs::create_symlink(zoneinfo_path.c_str(), paths::zoneinfo_link);
+  fs::create_symlink(tree, paths::zoneinfo_link);
 }

@@ -15,11 +15,14 @@ class vela_zoneinfo final : public vela_dataset_component {
   [[nodiscard]] const std::string& get_version_text() const { return version_text; }
 
   /// Always: any tree can serve in the place of any other.
-  [[nodiscard]] bool compatible_schema(const vela_dataset_component& other) const override;
+  [[nodiscard]] bool compatible_schema(const vela_dataset_component& /*other*/) const override {
+    return true;
+  }
 
-  /// Replaces "/var/db/timezone/zoneinfo" by a link to this tree, whether or not it exists.
-  /// Prints "Unlink of zoneinfo softlink failed" when the old link cannot be removed, and tries to
-  /// create the new one all the same; throws `int` when that fails.
+  /// Puts a link to this tree, whether or not it exists, in the place of
+  /// "/var/db/timezone/zoneinfo": in one step, or else by a removal and a creation. When that
+  /// removal fails, prints "Unlink of zoneinfo softlink failed" and goes on; throws `int` when the
+  /// creation fails.
   void activate() const override;
 
  private:

@@ -4,9 +4,12 @@
 
 #include <array>
 #include <cerrno>
+#include <chrono>
 #include <cstddef>
+#include <cstdio>
 #include <initializer_list>
 #include <string_view>
+#include <thread>
 
 #include "fs/report.h"
 
@@ -40,6 +43,25 @@ std::string read_symlink(const char* path) {
 
 void create_symlink(const char* target, const char* link) {
   if (::symlink(target, link) != 0) fail("create_symlink: from %s to %s", {link, target});
+}
+
+bool replace_symlink(const char* target, const char* link, const char* new_link) noexcept {
+  constexpr int waits = 10;
+  for (int attempt = 0; attempt < 2 * waits; ++attempt) {
+    if (::symlink(target, new_link) == 0) {
+      if (::rename(new_link, link) == 0) return true;
+      if (errno == ENOENT) continue;  // a run that had waited took it for a left-over
+      ::unlink(new_link);
+      return false;
+    }
+    if (errno != EEXIST) return false;
+    if (attempt == waits) {
+      ::unlink(new_link);
+    } else {
+      std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+  }
+  return false;
 }
 
 }  // namespace fs

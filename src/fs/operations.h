@@ -28,4 +28,13 @@ void remove(const char* path);
 /// On failure prints "create_symlink: from %s to %s" (the link's path first) and throws `int`.
 void create_symlink(const char* target, const char* link);
 
+/// Puts a link with the content `target` in the place of the link or file at `link`, if any, in one
+/// step: whoever looks sees what stood there or the new link. It is made at `new_link`, beside
+/// `link`, and renamed. What stands at `new_link` belongs to another run that is at work or was
+/// killed: it has ten milliseconds to go away, and is removed then.
+/// False where this cannot be done (a directory stands at `link`, say) and `link` is as it was.
+/// Prints and throws nothing.
+[[nodiscard]] bool replace_symlink(const char* target, const char* link,
+                                   const char* new_link) noexcept;
+
 }  // namespace fs

@@ -19,7 +19,7 @@ std::string current_dataset_path() {
 
 std::string dataset_path_from_link(const std::string& target) {
   constexpr std::string_view downloads = paths::downloads;
-  if (target.size() > downloads.size() && target.starts_with(downloads)) {
+  if (target.starts_with(downloads)) {
     // A "/" right behind the prefix is as bad as none: it would leave no directory name.
     const std::size_t last_slash = target.rfind('/');
     if (last_slash > downloads.size()) return target.substr(0, last_slash);

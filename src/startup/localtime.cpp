@@ -13,9 +13,10 @@ namespace {
 
 constexpr const char* default_zone = "America/Los_Angeles";
 
-/// Puts a link in the place of whatever can be removed there: unlike `fs::remove`, the C library's
-/// remove(3) takes an empty directory away too, and is silent where it fails.
+/// Puts a link in the place of whatever can be replaced or removed there: unlike `fs::remove`, the
+/// C library's remove(3) takes an empty directory away too, and is silent where it fails.
 void replace_localtime_link(const char* target) {
+  if (fs::replace_symlink(target, paths::localtime_link, paths::new_localtime_link)) return;
   static_cast<void>(std::remove(paths::localtime_link));
   fs::create_symlink(target, paths::localtime_link);
 }
