@@ -30,6 +30,9 @@ inline constexpr const char* new_zoneinfo_link = "/var/db/timezone/zoneinfo.new"
 inline constexpr const char* new_icu_link = "/var/db/timezone/icutz.new";
 inline constexpr const char* new_localtime_link = "/var/db/timezone/localtime.new";
 
+// Stands while a dataset is being activated: the next run sees it if this one is killed.
+inline constexpr const char* switching_mark = "/var/db/timezone/.switching";
+
 // Tells which version the last switch came from and which it went to.
 inline constexpr const char* record = "/var/db/timezone/TZVersionDiffRecord";
 

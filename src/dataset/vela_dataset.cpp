@@ -8,6 +8,7 @@
 
 #include "dataset/vela_icu.h"
 #include "dataset/vela_zoneinfo.h"
+#include "fs/mark.h"
 #include "fs/report.h"
 #include "paths.h"
 
@@ -39,5 +40,6 @@ bool vela_dataset::compatible_schema(const vela_dataset& other) const {
 }
 
 void vela_dataset::activate() const {
+  const fs::mark switching(paths::switching_mark);
   for (const auto& component : components) component->activate();
 }

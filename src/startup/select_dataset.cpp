@@ -5,6 +5,7 @@
 
 #include "dataset/vela_dataset.h"
 #include "fs/file.h"
+#include "fs/operations.h"
 #include "fs/report.h"
 #include "paths.h"
 #include "startup/dataset_links.h"
@@ -29,6 +30,7 @@ void select_dataset() {
   const vela_dataset system;
   const std::string latest_path = latest_dataset_path();
   const vela_dataset current(current_path_or_reset());
+  if (fs::exists(paths::switching_mark)) current.activate();
 
   const vela_dataset* baseline = &current;
   if (!current.compatible_schema(system) || system > current) {
