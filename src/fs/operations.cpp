@@ -50,17 +50,16 @@ bool replace_symlink(const char* target, const char* link, const char* new_link)
   for (int attempt = 0; attempt < 2 * waits; ++attempt) {
     if (::symlink(target, new_link) == 0) {
       if (::rename(new_link, link) == 0) return true;
-      if (errno == ENOENT) continue;  // a run that had waited took it for a left-over
-      ::unlink(new_link);
+      if (errno != ENOENT) break;  // else a run that had waited took it for a left-over
+    } else if (errno != EEXIST) {
       return false;
-    }
-    if (errno != EEXIST) return false;
-    if (attempt == waits) {
+    } else if (attempt == waits) {
       ::unlink(new_link);
     } else {
       std::this_thread::sleep_for(std::chrono::milliseconds(1));
     }
   }
+  ::unlink(new_link);
   return false;
 }
 
