@@ -2,10 +2,11 @@
 // and with fixed paths, as a plain C program needs them, and nothing besides: no decision, no copy
 // of a text, no look at what a call gives.
 
+#include <dirent.h>
 #include <fcntl.h>
-#include <fts.h>
 #include <stdio.h>
 #include <string.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #define STORAGE "/var/db/timezone/"
@@ -27,12 +28,13 @@ static void read_word(const char* path) {
 }
 
 static void read_download(void) {
-  static char* const roots[] = {DOWNLOAD "/icutz", NULL};
+  struct stat found;
   read_word(DOWNLOAD "/zoneinfo/+VERSION");
-  FTS* const walk = fts_open(roots, FTS_COMFOLLOW | FTS_PHYSICAL | FTS_XDEV, NULL);
-  while (fts_read(walk)->fts_info != FTS_F) {
+  DIR* const directory = opendir(DOWNLOAD "/icutz");
+  while (strcmp(readdir(directory)->d_name, "icutz44l.dat") != 0) {
   }
-  fts_close(walk);
+  fstatat(dirfd(directory), "icutz44l.dat", &found, AT_SYMLINK_NOFOLLOW);
+  closedir(directory);
 }
 
 int main(void) {
@@ -48,6 +50,7 @@ int main(void) {
   ignored = readlink(STORAGE "tz_latest", buffer, sizeof buffer);
   ignored = readlink(STORAGE "zoneinfo", buffer, sizeof buffer);
   read_download();
+  access(STORAGE ".switching", F_OK);
   read_download();
   ignored = write(STDERR_FILENO, message, strlen(message));
   ignored = readlink(STORAGE "localtime", buffer, sizeof buffer);
