@@ -29,8 +29,7 @@ std::vector<scene> read_scenes() {
   std::map<std::string, std::string> definitions;
   std::vector<scene> scenes;
   std::ifstream file(WORLDS);
-  for (std::string line, more; std::getline(file, line);) {
-    while (file.peek() == ' ' && std::getline(file, more)) line += more.substr(3);
+  for (std::string line; std::getline(file, line);) {
     if (line.starts_with('#')) continue;
     for (std::smatch use; std::regex_search(line, use, std::regex(R"(\$(\w+))"));) {
       line.replace(use[0].first, use[0].second, definitions.at(use[1]));
