@@ -1,5 +1,7 @@
 #include "dataset/vela_dataset.h"
 
+#include <unistd.h>
+
 #include <algorithm>
 #include <cerrno>
 #include <stdexcept>
@@ -8,9 +10,26 @@
 
 #include "dataset/vela_icu.h"
 #include "dataset/vela_zoneinfo.h"
-#include "fs/mark.h"
 #include "fs/report.h"
 #include "paths.h"
+
+namespace {
+
+/// The mark of an activation, for the length of a scope: a link to ".", so that `fs::exists` sees
+/// it. One that stands already is taken over; where none can be made, the scope goes on without.
+class mark final {
+ public:
+  mark() noexcept { static_cast<void>(::symlink(".", paths::switching_mark)); }
+  ~mark() {
+    const int error = errno;  // that of a failure on its way to a handler
+    ::unlink(paths::switching_mark);
+    errno = error;
+  }
+  mark(const mark&) = delete;
+  mark& operator=(const mark&) = delete;
+};
+
+}  // namespace
 
 vela_dataset::vela_dataset(std::string dataset_path) : path(std::move(dataset_path)) {
   create_components();
@@ -40,6 +59,6 @@ bool vela_dataset::compatible_schema(const vela_dataset& other) const {
 }
 
 void vela_dataset::activate() const {
-  const fs::mark switching(paths::switching_mark);
+  const mark switching;
   for (const auto& component : components) component->activate();
 }

@@ -3,6 +3,7 @@
 #include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
@@ -15,15 +16,6 @@
 
 namespace {
 
-struct closes_directory {
-  void operator()(DIR* directory) const noexcept {
-    const int error = errno;
-    ::closedir(directory);
-    errno = error;
-  }
-};
-using open_directory = std::unique_ptr<DIR, closes_directory>;
-
 /// Whether an entry is itself a regular file that everyone may read.
 bool is_public_file(DIR* directory, const char* name) noexcept {
   struct stat found {};
@@ -33,7 +25,11 @@ bool is_public_file(DIR* directory, const char* name) noexcept {
 
 /// The schema of the first data file in a download's directory; empty where there is none.
 std::string find_schema(const char* path) {
-  const open_directory directory(::opendir(path));
+  const std::unique_ptr<DIR, void (*)(DIR*)> directory(::opendir(path), [](DIR* opened) {
+    const int error = errno;  // that of a failure on its way to a handler
+    ::closedir(opened);
+    errno = error;
+  });
   if (directory == nullptr) {
     if (errno != ENOMEM) return {};
     fs::report(ENOMEM, "tz_icu::initialize: fts_open of %s failed, %s",
@@ -97,5 +93,8 @@ void vela_icu::activate() const {
   } catch (...) {
     fs::report(errno, "unlink of ICU softlink failed");
   }
-  if (is_download && !replaced) fs::create_symlink(data, paths::icu_link);
+  if (is_download && !replaced) {
+    ::unlink(paths::switching_mark);  // on a full storage, the room it takes
+    fs::create_symlink(data, paths::icu_link);
+  }
 }

@@ -1,6 +1,5 @@
 #include "dataset/vela_version.h"
 
-#include <algorithm>
 #include <cerrno>
 #include <charconv>
 #include <stdexcept>
@@ -11,16 +10,12 @@
 
 namespace {
 
-bool is_digit(char byte) {
-  return byte >= '0' && byte <= '9';
-}
-bool is_lower_case(char byte) {
-  return byte >= 'a' && byte <= 'z';
-}
+constexpr std::string_view digits = "0123456789";
+constexpr std::string_view lower_case = "abcdefghijklmnopqrstuvwxyz";
 
-/// Cuts the longest run of bytes of one kind off the front of `rest`; may be empty.
-std::string_view take_run(std::string_view& rest, bool (*is_of_kind)(char)) {
-  const std::string_view run(rest.begin(), std::find_if_not(rest.begin(), rest.end(), is_of_kind));
+/// Cuts the longest run of some bytes off the front of `rest`; may be empty.
+std::string_view take_run(std::string_view& rest, std::string_view bytes) {
+  const std::string_view run = rest.substr(0, rest.find_first_not_of(bytes));
   rest.remove_prefix(run.size());
   return run;
 }
@@ -30,7 +25,7 @@ std::string_view take_run(std::string_view& rest, bool (*is_of_kind)(char)) {
 std::string_view take_dotted_number(std::string_view& rest) {
   if (!rest.starts_with('.')) return {};
   std::string_view behind_dot = rest.substr(1);
-  const std::string_view number = take_run(behind_dot, is_digit);
+  const std::string_view number = take_run(behind_dot, digits);
   if (!number.empty()) rest = behind_dot;
   return number;
 }
@@ -51,8 +46,8 @@ std::int32_t to_number(std::string_view number) {
 // ([0-9]+)([a-z]+)(?:\.([0-9]+))?(?:\.([0-9]+))?
 void vela_version::parse(const std::string& text) {
   std::string_view rest = text;
-  const std::string_view year_digits = take_run(rest, is_digit);
-  const std::string_view letter_run = take_run(rest, is_lower_case);
+  const std::string_view year_digits = take_run(rest, digits);
+  const std::string_view letter_run = take_run(rest, lower_case);
   const std::string_view major_digits = take_dotted_number(rest);
   const std::string_view minor_digits = take_dotted_number(rest);
   if (year_digits.empty() || letter_run.empty() || !rest.empty()) {

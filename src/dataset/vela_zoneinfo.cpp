@@ -1,5 +1,7 @@
 #include "dataset/vela_zoneinfo.h"
 
+#include <unistd.h>
+
 #include <cerrno>
 
 #include "fs/file.h"
@@ -20,5 +22,6 @@ void vela_zoneinfo::activate() const {
   } catch (...) {
     fs::report(errno, "Unlink of zoneinfo softlink failed");
   }
+  ::unlink(paths::switching_mark);  // on a full storage, the room it takes
   fs::create_symlink(tree, paths::zoneinfo_link);
 }

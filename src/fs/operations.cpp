@@ -4,12 +4,10 @@
 
 #include <array>
 #include <cerrno>
-#include <chrono>
 #include <cstddef>
 #include <cstdio>
 #include <initializer_list>
 #include <string_view>
-#include <thread>
 
 #include "fs/report.h"
 
@@ -56,7 +54,7 @@ bool replace_symlink(const char* target, const char* link, const char* new_link)
     } else if (attempt == waits) {
       ::unlink(new_link);
     } else {
-      std::this_thread::sleep_for(std::chrono::milliseconds(1));
+      ::usleep(1000);
     }
   }
   ::unlink(new_link);

@@ -1,5 +1,7 @@
 #include "startup/select_dataset.h"
 
+#include <unistd.h>
+
 #include <cerrno>
 #include <string>
 
@@ -24,13 +26,22 @@ std::string current_path_or_reset() {
   }
 }
 
+/// Whether a run was killed while it activated a dataset: one at work is over in ten milliseconds.
+bool was_interrupted() noexcept {
+  for (int waits = 10; fs::exists(paths::switching_mark); --waits) {
+    if (waits == 0) return true;
+    ::usleep(1000);
+  }
+  return false;
+}
+
 }  // namespace
 
 void select_dataset() {
   const vela_dataset system;
   const std::string latest_path = latest_dataset_path();
   const vela_dataset current(current_path_or_reset());
-  if (fs::exists(paths::switching_mark)) current.activate();
+  if (was_interrupted()) current.activate();
 
   const vela_dataset* baseline = &current;
   if (!current.compatible_schema(system) || system > current) {

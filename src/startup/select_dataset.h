@@ -5,8 +5,8 @@
 /// newest download if that has the system copy's schema and is newer than the current dataset,
 /// and records the switch in "/var/db/timezone/TZVersionDiffRecord".
 ///
-/// Where an earlier run was killed while it activated a dataset, first activates the current one
-/// again, without a word of its own: the zoneinfo link, changed first, tells how far that run got.
+/// Where a run was killed while it activated a dataset, first activates the current one again,
+/// without a word of its own: the zoneinfo link, changed first, tells how far that run got.
 ///
 /// Handles a current link that cannot be read or understood (by a reset) and a record that cannot
 /// be written (by going on without); throws on every other failure.
