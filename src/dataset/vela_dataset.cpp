@@ -19,7 +19,7 @@ namespace {
 /// it. One that stands already is taken over; where none can be made, the scope goes on without.
 class mark final {
  public:
-  mark() noexcept { static_cast<void>(::symlink(".", paths::switching_mark)); }
+  mark() noexcept { [[maybe_unused]] const int ignored = ::symlink(".", paths::switching_mark); }
   ~mark() {
     const int error = errno;  // that of a failure on its way to a handler
     ::unlink(paths::switching_mark);
