@@ -28,14 +28,12 @@ WINDOWS = {
 }
 
 
-# The status of a run; that of a kill where it takes longer than two seconds.
-def run(*strace):
-    command = ["timeout", "-s", "KILL", "2", *strace, "build/release/kestrel"]
+# The status of a run under strace with some options, or of a clean one; that of a kill where it
+# takes longer than two seconds.
+def run(options=""):
+    tracer = f"strace -o /tmp/trace {options}" if options else ""
+    command = f"timeout -s KILL 2 {tracer} build/release/kestrel".split()
     return subprocess.run(command, stderr=subprocess.DEVNULL, check=False).returncode
-
-
-def run_with(fault):
-    return run("strace", "-o", "/dev/null", "-e", "inject=" + fault)
 
 
 def make(world):
@@ -51,7 +49,7 @@ def state():
 
 # The program's own calls in a run from what stands there: each line, its call, and which of them.
 def traced():
-    run("strace", "-o", "/tmp/trace")
+    run("-e trace=all")
     seen, own = Counter(), False
     for line in Path("/tmp/trace").read_text().splitlines()[:-1]:
         name = line.split("(")[0]
@@ -74,7 +72,7 @@ def trials():
             yield world, name, [kill]
             if CHANGING.match(line):
                 make(world)
-                run_with(kill)
+                run(f"-e inject={kill}")
                 for line, _, place in list(traced()):
                     if CHANGING.match(line):
                         yield world, name, [kill, place + ":signal=KILL"]
@@ -86,7 +84,7 @@ def campaign(chosen):
     for world, call, faults in [(world, "", []) for world in WORLDS] + chosen:
         make(world)
         killed = "KILL" in "".join(faults)
-        ends = [run_with(fault) for fault in faults] + [run()]
+        ends = [run(f"-e inject={fault}") for fault in faults] + [run()]
         counts[killed] += len(faults)
         if ends != [-9 if killed else 0] * len(faults) + [0]:
             failed = True
