@@ -39,8 +39,8 @@ TEST(Texts, VersionOrder) {
   }
 }
 
-/// What fuzz/fuzz.cpp holds against the code: the patterns that the scanners stand for, the laws of
-/// the order, a second way to see a link. On random texts of the pieces that matter.
+/// What fuzz/fuzz.cpp holds against the code: the patterns that the scanners stand for, a second
+/// way to see a link. On random texts of the pieces that matter.
 TEST(Texts, AgreeWithTheirPatterns) {
   const std::string pieces[] = {"0", "19", "7", "a", "mz", ".", ".1", "/",     ":",
                                 "`", "{",  "A", " ", "l",  "b", "e",  "icutz", ".dat"};

@@ -10,7 +10,6 @@
 #include <map>
 #include <regex>
 #include <sstream>
-#include <stdexcept>
 
 namespace files = std::filesystem;
 
@@ -43,7 +42,8 @@ std::vector<scene> read_scenes() {
       if (!says.empty()) says.insert(0, "kestrel: ").append("\n");
       scenes.push_back({part[1], part[2], part[3], says});
     } else if (!line.empty()) {
-      throw std::invalid_argument("worlds.txt: " + line);
+      std::cerr << "worlds.txt: " << line << '\n';
+      std::exit(1);
     }
   }
   return scenes;
