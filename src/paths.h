@@ -1,7 +1,7 @@
 #pragma once
 
-/// Every path that a run touches, except what lies below a link's target.
-/// All are absolute and none is configurable.
+/// The fixed paths of a run, absolute and not configurable. The names inside a copy of the data,
+/// such as "+VERSION", stand where they are read (`dataset/`).
 namespace paths {
 
 // The system copy, shipped read-only with the operating system.
