@@ -2,6 +2,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <optional>
 #include <regex>
 #include <sstream>
 #include <stdexcept>
@@ -20,23 +21,23 @@ void require(bool holds) {
 
 void check_version(const std::string& text) {
   static const std::regex pattern(R"(([0-9]+)([a-z]+)(?:\.([0-9]+))?(?:\.([0-9]+))?)");
-  vela_version version, expected;
-  bool out_of_range = false;
+  vela_version version;
+  std::optional<vela_version> expected = version;
   std::smatch match;
   try {
     const auto number = [](const std::ssub_match& group) {
       return group.matched ? std::stoi(group) : -1;
     };
     if (std::regex_match(text, match, pattern))
-      expected = {number(match[1]), match[2], number(match[3]), number(match[4])};
+      expected = vela_version{number(match[1]), match[2], number(match[3]), number(match[4])};
   } catch (const std::out_of_range&) {
-    out_of_range = true;
+    expected.reset();
   }
   try {
     version.parse(text);
-    require(version == expected && !out_of_range);
+    require(version == expected);
   } catch (const std::out_of_range&) {
-    require(out_of_range);
+    require(!expected);
   }
 }
 
