@@ -48,8 +48,7 @@ void vela_dataset::create_components() {
     throw std::invalid_argument("badpath");
   }
   version.parse(version_string);
-  components.push_back(zoneinfo);
-  components.push_back(std::shared_ptr<vela_dataset_component>(new vela_icu(path)));
+  components = {zoneinfo, std::shared_ptr<vela_dataset_component>(new vela_icu(path))};
 }
 
 bool vela_dataset::compatible_schema(const vela_dataset& other) const {

@@ -4,6 +4,7 @@
 
 #include <cerrno>
 #include <string>
+#include <utility>
 
 #include "dataset/vela_dataset.h"
 #include "fs/file.h"
@@ -39,7 +40,7 @@ bool was_interrupted() noexcept {
 
 void select_dataset() {
   const vela_dataset system;
-  const std::string latest_path = latest_dataset_path();
+  std::string latest_path = latest_dataset_path();
   const vela_dataset current(current_path_or_reset());
   if (was_interrupted()) current.activate();
 
@@ -51,7 +52,7 @@ void select_dataset() {
   }
 
   if (latest_path.empty()) return;
-  const vela_dataset latest(latest_path);
+  const vela_dataset latest(std::move(latest_path));
   // Against the current dataset, not the baseline: a download older than the system copy still
   // replaces an even older one.
   if (latest.compatible_schema(system) && latest > current) {
