@@ -23,6 +23,7 @@ vela_version parsed(const std::string& text) {
 }
 
 TEST(Texts, Versions) {
+  EXPECT_EQ(parsed("2022"), vela_version());
   EXPECT_EQ(parsed("02147483647z.0.20"), (vela_version{2147483647, "z", 0, 20}));
   vela_version version;
   EXPECT_THROW(version.parse("2147483648a"), std::out_of_range);
