@@ -29,7 +29,8 @@ class vela_dataset {
   [[nodiscard]] bool compatible_schema(const vela_dataset& other) const;
 
   /// Makes this copy the active one, component by component: zoneinfo, then ICU. What a component
-  /// throws ends it; those before it stay active. Meanwhile "/var/db/timezone/.switching" stands.
+  /// throws ends it; those before it stay active. Meanwhile "/var/db/timezone/.switching" stands,
+  /// until a link takes two steps: the mark makes room for that one.
   void activate() const;
 
   /// The text that the version was parsed from: what follows "/var/db/timezone/tz/" in a download's

@@ -94,7 +94,7 @@ void vela_icu::activate() const {
     fs::report(errno, "unlink of ICU softlink failed");
   }
   if (is_download && !replaced) {
-    ::unlink(paths::switching_mark);  // on a full storage, the room it takes
+    ::unlink(paths::switching_mark);  // on a full storage, the last room
     fs::create_symlink(data, paths::icu_link);
   }
 }
