@@ -60,8 +60,10 @@ std::string read_first_word(const char* path) noexcept {
 }
 
 void write_file(const char* path, std::string_view content) noexcept {
-  const descriptor file = open_regular(path, O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW);
-  if (!file.is_open()) return;
+  const descriptor file = open_regular(path, O_WRONLY | O_CREAT | O_NOFOLLOW);
+  struct stat opened {};
+  if (!file.is_open() || ::fstat(file.get(), &opened) != 0 || opened.st_nlink > 1) return;
+  if (::ftruncate(file.get(), 0) != 0) return;
   [[maybe_unused]] const ssize_t ignored = ::write(file.get(), content.data(), content.size());
 }
 
