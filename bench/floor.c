@@ -50,7 +50,7 @@ int main(void) {
   ignored = readlink(STORAGE "tz_latest", buffer, sizeof buffer);
   ignored = readlink(STORAGE "zoneinfo", buffer, sizeof buffer);
   read_download();
-  access(STORAGE ".switching", F_OK);
+  ignored = readlink(STORAGE "icutz.new", buffer, sizeof buffer);
   read_download();
   ignored = write(STDERR_FILENO, message, strlen(message));
   ignored = readlink(STORAGE "localtime", buffer, sizeof buffer);

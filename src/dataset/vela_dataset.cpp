@@ -10,26 +10,9 @@
 
 #include "dataset/vela_icu.h"
 #include "dataset/vela_zoneinfo.h"
+#include "fs/operations.h"
 #include "fs/report.h"
 #include "paths.h"
-
-namespace {
-
-/// The mark of an activation, for the length of a scope: a link to ".", so that `fs::exists` sees
-/// it. One that stands already is taken over; where none can be made, the scope goes on without.
-class mark final {
- public:
-  mark() noexcept { [[maybe_unused]] const int ignored = ::symlink(".", paths::switching_mark); }
-  ~mark() {
-    const int error = errno;  // that of a failure on its way to a handler
-    ::unlink(paths::switching_mark);
-    errno = error;
-  }
-  mark(const mark&) = delete;
-  mark& operator=(const mark&) = delete;
-};
-
-}  // namespace
 
 vela_dataset::vela_dataset(std::string dataset_path) : path(std::move(dataset_path)) {
   create_components();
@@ -58,6 +41,20 @@ bool vela_dataset::compatible_schema(const vela_dataset& other) const {
 }
 
 void vela_dataset::activate() const {
-  const mark switching;
-  for (const auto& component : components) component->activate();
+  // First of all, and for the system copy as well, which has no ICU link: if this run is killed
+  // between the components, the next one sees by this link what to finish.
+  static_cast<void>(fs::stage_symlink(icu_directory(path).c_str(), paths::new_icu_link));
+  try {
+    for (const auto& component : components) component->activate();
+  } catch (...) {
+    const int error = errno;
+    ::unlink(paths::new_icu_link);
+    errno = error;
+    throw;
+  }
+}
+
+void vela_dataset::finish() const {
+  if (fs::is_symlink_to(icu_directory(path).c_str(), paths::new_icu_link))
+    components.back()->activate();
 }

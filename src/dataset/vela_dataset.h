@@ -18,20 +18,24 @@ class vela_dataset {
   /// Throws also what parsing the version and constructing the components throw.
   explicit vela_dataset(std::string dataset_path = {});
 
-  /// Whether both lie in the same place.
+  /// Whether both have the same path.
   bool operator==(const vela_dataset& other) const { return path == other.path; }
 
   /// Whether this one's version is strictly newer.
   bool operator>(const vela_dataset& other) const { return version > other.version; }
 
-  /// Whether each component can stand in for the other dataset's in the same position. Not
-  /// symmetric: it is this dataset's components that are asked.
+  /// Whether each component can serve in the place of the other dataset's in the same position.
+  /// Not symmetric: this dataset's components are asked.
   [[nodiscard]] bool compatible_schema(const vela_dataset& other) const;
 
-  /// Makes this copy the active one, component by component: zoneinfo, then ICU. What a component
-  /// throws ends it; those before it stay active. Meanwhile "/var/db/timezone/.switching" stands,
-  /// until a link takes two steps: the mark makes room for that one.
+  /// Makes this copy the active one: zoneinfo first, then ICU. Meanwhile,
+  /// "/var/db/timezone/icutz.new" is a link to its ICU data. What a component throws ends it.
   void activate() const;
+
+  /// Completes an activation of this dataset that was killed after the zoneinfo link: activates the
+  /// ICU component, if "/var/db/timezone/icutz.new" is a link to this copy's ICU data. To be called
+  /// only on the dataset that the zoneinfo link names. Throws what that activation throws.
+  void finish() const;
 
   /// The text that the version was parsed from: what follows "/var/db/timezone/tz/" in a download's
   /// path, or the first word of the system copy's "+VERSION" followed by ".1.0".

@@ -4,10 +4,9 @@
 #include <utility>
 
 /// One kind of time-zone data of one dataset, and the link through which the system reads it.
-///
-/// A component knows all about its files when it is constructed and never changes. It is held by
-/// a shared pointer made from a pointer to its concrete class, which destroys it as that class;
-/// the protected destructor keeps anyone from deleting it through this one.
+/// It reads its files when it is constructed and never changes. It is held by a shared pointer made
+/// from a pointer to its concrete class; the protected destructor keeps anyone from deleting it
+/// through this one.
 class vela_dataset_component {
  public:
   /// Whether `other` can serve in this component's place.
@@ -21,6 +20,6 @@ class vela_dataset_component {
   explicit vela_dataset_component(std::string path = {}) : dataset_path(std::move(path)) {}
   ~vela_dataset_component() = default;
 
-  /// The directory of the download that this is a part of; empty for the system copy.
+  /// The directory of the download; empty for the system copy.
   const std::string dataset_path;
 };

@@ -59,8 +59,12 @@ std::string_view data_file_schema(std::string_view name) {
   return matches ? name : std::string_view();
 }
 
+std::string icu_directory(const std::string& dataset_path) {
+  return dataset_path.empty() ? paths::system_icu : dataset_path + "/icutz";
+}
+
 vela_icu::vela_icu(const std::string& path)
-    : vela_dataset_component(path), icu_path(path.empty() ? paths::system_icu : path + "/icutz") {
+    : vela_dataset_component(path), icu_path(icu_directory(path)) {
   initialize();
 }
 
@@ -93,8 +97,9 @@ void vela_icu::activate() const {
   } catch (...) {
     fs::report(errno, "unlink of ICU softlink failed");
   }
-  if (is_download && !replaced) {
-    ::unlink(paths::switching_mark);  // on a full storage, the last room
+  if (!is_download) {
+    ::unlink(paths::new_icu_link);
+  } else if (!replaced) {
     fs::create_symlink(data, paths::icu_link);
   }
 }

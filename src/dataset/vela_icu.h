@@ -9,7 +9,7 @@
 /// active when that link is absent.
 class vela_icu final : public vela_dataset_component {
  public:
-  /// The ICU data "icutz" in the directory `path`, or the system copy's for the empty path.
+  /// The ICU data of the dataset in the directory `path`, or the system copy's for the empty path.
   /// Throws what `initialize` throws.
   explicit vela_icu(const std::string& path = {});
 
@@ -17,23 +17,27 @@ class vela_icu final : public vela_dataset_component {
   /// "vela_icu::compatible_schema: could not dynamic_cast other component".
   [[nodiscard]] bool compatible_schema(const vela_dataset_component& other) const override;
 
-  /// For a download, puts a link to this directory in the place of "/var/db/timezone/icutz", in one
-  /// step or else by a removal and a creation; for the system copy, removes it. Then removes the
-  /// legacy "/var/db/icutz". The first removal that fails is the last: prints
-  /// "unlink of ICU softlink failed" and goes on; throws `int` when the creation fails.
+  /// For a download, replaces "/var/db/timezone/icutz" by a link to this directory, in one step or
+  /// by a removal and a creation; for the system copy, removes it. Then removes the legacy
+  /// "/var/db/icutz". After a removal that fails, prints "unlink of ICU softlink failed" and makes
+  /// no other. Throws `int` when the link cannot be created.
   void activate() const override;
 
  private:
   /// Finds the schema: the first word of the system copy's "icutzformat.txt", or, for a download,
   /// that in the name of the first data file listed in its directory: a regular file, readable by
   /// others. A download without one prints "No ICU schema found for %s", whatever the reason.
-  /// Prints "tz_icu::initialize: fts_open of %s failed, %s" and throws `int` where there is no
-  /// memory for reading the directory.
+  /// Without memory for reading the directory, prints "tz_icu::initialize: fts_open of %s failed,
+  /// %s" and throws `int`.
   void initialize();
 
   std::string schema;
   const std::string icu_path;
 };
+
+/// The ICU data of the dataset in the directory `dataset_path`, the system copy's for the empty
+/// one.
+[[nodiscard]] std::string icu_directory(const std::string& dataset_path);
 
 /// The schema in the name of an ICU data file, 44l for icutz44l.dat; empty for any other name.
 [[nodiscard]] std::string_view data_file_schema(std::string_view name);

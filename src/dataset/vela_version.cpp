@@ -2,7 +2,6 @@
 
 #include <cerrno>
 #include <charconv>
-#include <cstddef>
 #include <stdexcept>
 #include <string_view>
 #include <system_error>
@@ -11,12 +10,12 @@
 
 namespace {
 
-/// Cuts the longest run of bytes from `first` to `last` off the front of `rest`; may be empty.
-std::string_view take_run(std::string_view& rest, char first, char last) {
-  std::size_t length = 0;
-  while (length < rest.size() && rest[length] >= first && rest[length] <= last) ++length;
-  const std::string_view run = rest.substr(0, length);
-  rest.remove_prefix(length);
+constexpr std::string_view digits = "0123456789";
+
+/// Cuts the longest run of bytes that are among `allowed` off the front of `rest`; may be empty.
+std::string_view take_run(std::string_view& rest, std::string_view allowed) {
+  const std::string_view run = rest.substr(0, rest.find_first_not_of(allowed));
+  rest.remove_prefix(run.size());
   return run;
 }
 
@@ -25,7 +24,7 @@ std::string_view take_run(std::string_view& rest, char first, char last) {
 std::string_view take_dotted_number(std::string_view& rest) {
   if (!rest.starts_with('.')) return {};
   std::string_view behind_dot = rest.substr(1);
-  const std::string_view number = take_run(behind_dot, '0', '9');
+  const std::string_view number = take_run(behind_dot, digits);
   if (!number.empty()) rest = behind_dot;
   return number;
 }
@@ -46,8 +45,8 @@ std::int32_t to_number(std::string_view number) {
 // ([0-9]+)([a-z]+)(?:\.([0-9]+))?(?:\.([0-9]+))?
 void vela_version::parse(const std::string& text) {
   std::string_view rest = text;
-  const std::string_view year_digits = take_run(rest, '0', '9');
-  const std::string_view letter_run = take_run(rest, 'a', 'z');
+  const std::string_view year_digits = take_run(rest, digits);
+  const std::string_view letter_run = take_run(rest, "abcdefghijklmnopqrstuvwxyz");
   const std::string_view major_digits = take_dotted_number(rest);
   const std::string_view minor_digits = take_dotted_number(rest);
   if (year_digits.empty() || letter_run.empty() || !rest.empty()) {

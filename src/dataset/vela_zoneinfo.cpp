@@ -22,6 +22,6 @@ void vela_zoneinfo::activate() const {
   } catch (...) {
     fs::report(errno, "Unlink of zoneinfo softlink failed");
   }
-  ::unlink(paths::switching_mark);  // on a full storage, the last room
+  ::unlink(paths::new_icu_link);  // on a full storage, the last room
   fs::create_symlink(tree, paths::zoneinfo_link);
 }

@@ -14,15 +14,15 @@ class vela_zoneinfo final : public vela_dataset_component {
   /// The first word of "+VERSION", of whatever form.
   [[nodiscard]] const std::string& get_version_text() const { return version_text; }
 
-  /// Always: any tree can serve in the place of any other.
+  /// Always true: any tree can serve in the place of any other.
   [[nodiscard]] bool compatible_schema(const vela_dataset_component& /*other*/) const override {
     return true;
   }
 
-  /// Puts a link to this tree, whether or not it exists, in the place of
-  /// "/var/db/timezone/zoneinfo": in one step, or else by a removal and a creation. When that
-  /// removal fails, prints "Unlink of zoneinfo softlink failed" and goes on; throws `int` when the
-  /// creation fails.
+  /// Replaces "/var/db/timezone/zoneinfo" by a link to this tree, whether or not the tree exists:
+  /// in one step, or by a removal and a creation. After a removal that fails, prints "Unlink of
+  /// zoneinfo softlink failed" and tries the creation. Throws `int` when the link cannot be
+  /// created.
   void activate() const override;
 
  private:

@@ -1,24 +1,44 @@
 #include "fs/operations.h"
 
+#include <sys/statfs.h>
 #include <unistd.h>
 
 #include <array>
 #include <cerrno>
+#include <climits>
 #include <cstddef>
-#include <cstdio>
 #include <initializer_list>
 #include <string_view>
 
 #include "fs/report.h"
+#include "paths.h"
 
 namespace fs {
 namespace {
+
+/// Whether the full storage has room for a link once another one is removed: it has run out of
+/// inodes, and is one of the file systems that can use a freed inode at once. Others let a link be
+/// removed and then refuse to make one: btrfs, and XFS even where it counts no free inode.
+bool removing_makes_room() noexcept {
+  constexpr long tmpfs = 0x01021994;
+  constexpr long ext4 = 0xef53;
+  const int error = errno;
+  struct statfs found {};
+  const bool known = ::statfs(paths::storage, &found) == 0;
+  errno = error;
+  return known && (found.f_type == tmpfs || found.f_type == ext4) && found.f_files > 0 &&
+         found.f_ffree == 0;
+}
 
 /// Reports the call that has just failed and throws its error number.
 [[noreturn]] void fail(std::string_view format, std::initializer_list<const char*> texts) {
   const int error = errno;
   report(error, format, texts);
   throw int{error};
+}
+
+[[noreturn]] void fail_to_link(const char* target, const char* link) {
+  fail("create_symlink: from %s to %s", {link, target});
 }
 
 }  // namespace
@@ -40,24 +60,28 @@ std::string read_symlink(const char* path) {
 }
 
 void create_symlink(const char* target, const char* link) {
-  if (::symlink(target, link) != 0) fail("create_symlink: from %s to %s", {link, target});
+  if (::symlink(target, link) != 0) fail_to_link(target, link);
 }
 
-bool replace_symlink(const char* target, const char* link, const char* new_link) noexcept {
-  constexpr int waits = 10;
-  for (int attempt = 0; attempt < 2 * waits; ++attempt) {
-    if (::symlink(target, new_link) == 0) {
-      if (::rename(new_link, link) == 0) return true;
-      if (errno != ENOENT) break;  // else a run that had waited took it for a left-over
-    } else if (errno != EEXIST) {
-      return false;
-    } else if (attempt == waits) {
-      ::unlink(new_link);
-    } else {
-      ::usleep(1000);
-    }
+bool is_symlink_to(const char* target, const char* link) noexcept {
+  std::array<char, PATH_MAX> content;
+  const ssize_t length = ::readlink(link, content.data(), content.size());
+  return length >= 0 &&
+         std::string_view(content.data(), static_cast<std::size_t>(length)) == target;
+}
+
+bool stage_symlink(const char* target, const char* staged) noexcept {
+  if (::symlink(target, staged) == 0 || is_symlink_to(target, staged)) return true;
+  ::unlink(staged);
+  return ::symlink(target, staged) == 0;
+}
+
+bool replace_symlink(const char* target, const char* link, const char* staged) {
+  if (stage_symlink(target, staged)) {
+    return ::rename(staged, link) == 0 ||
+           (::unlink(staged) != 0 && errno == ENOENT);  // another run has renamed it
   }
-  ::unlink(new_link);
+  if ((errno == ENOSPC || errno == EDQUOT) && !removing_makes_room()) fail_to_link(target, link);
   return false;
 }
 

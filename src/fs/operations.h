@@ -2,14 +2,13 @@
 
 #include <string>
 
-/// The file-system operations of the program. They turn a failed system call into a printed
-/// message followed by an exception, a plain `int` with the call's error number, and take a
-/// missing entry for a normal outcome. Paths and link contents are NUL-terminated byte strings,
-/// handed to the system call unchanged.
+/// The file-system operations of the program. A failed system call is printed and then thrown, as
+/// a plain `int` with the call's error number; a missing entry is a normal outcome. Paths and link
+/// contents are NUL-terminated byte strings and reach the system call unchanged.
 namespace fs {
 
-/// Removes the entry at `path`: a link itself, never what it points at; never a directory.
-/// A path that does not exist is fine.
+/// Removes the entry at `path`: a link itself, never its target; never a directory.
+/// Does nothing where `path` does not exist.
 /// On failure prints "remove: could not remove %s" and throws `int`.
 void remove(const char* path);
 
@@ -19,8 +18,8 @@ void remove(const char* path);
 
 /// The content of the link at `path`, as stored; no more than its first 1024 bytes.
 /// Empty when nothing exists at `path`.
-/// On failure (not a link, say) prints "read_symlink: %s" and throws `int`; throws std::bad_alloc
-/// where there is no memory for the content.
+/// On failure (not a link, for example) prints "read_symlink: %s" and throws `int`. Without memory
+/// for the content throws std::bad_alloc.
 [[nodiscard]] std::string read_symlink(const char* path);
 
 /// Makes a link at `link` with the content `target`, which need not exist. Replaces nothing:
@@ -28,13 +27,21 @@ void remove(const char* path);
 /// On failure prints "create_symlink: from %s to %s" (the link's path first) and throws `int`.
 void create_symlink(const char* target, const char* link);
 
-/// Puts a link with the content `target` in the place of the link or file at `link`, if any, in one
-/// step: whoever looks sees what stood there or the new link. It is made at `new_link`, beside
-/// `link`, and renamed. What stands at `new_link` belongs to another run that is at work or was
-/// killed: it has ten milliseconds to go away, and is removed then.
-/// False where this cannot be done (a directory stands at `link`, say) and `link` is as it was.
-/// Prints and throws nothing.
-[[nodiscard]] bool replace_symlink(const char* target, const char* link,
-                                   const char* new_link) noexcept;
+/// Whether `link` is a link with exactly the content `target`. Prints and throws nothing.
+[[nodiscard]] bool is_symlink_to(const char* target, const char* link) noexcept;
+
+/// Makes sure that a link with the content `target` is at `staged`, the name beside a link that is
+/// to be replaced. One with that content may be there already, from another run; any other entry
+/// that is no directory is removed first.
+/// False where the link cannot be made, with the number in errno. Prints and throws nothing.
+[[nodiscard]] bool stage_symlink(const char* target, const char* staged) noexcept;
+
+/// Replaces the link or file at `link`, if any, by a link with the content `target`, in one step:
+/// every reader finds the old entry or the new link. The new link is staged at `staged` and renamed
+/// to `link`; where another run renames it first, that run has the last word.
+/// False where this cannot be done (a directory is at `link`, for example); `link` is unchanged.
+/// Where the storage is full and removing a link would not make room for one, prints
+/// "create_symlink: from %s to %s" and throws `int`, so that nobody removes `link`.
+[[nodiscard]] bool replace_symlink(const char* target, const char* link, const char* staged);
 
 }  // namespace fs

@@ -10,18 +10,16 @@ namespace fs {
 ///     kestrel: MESSAGE: ERROR TEXT
 ///
 /// `error` is the error number of the failed call that the message is about, or 0 ("Success")
-/// where a message tells of a decision and no call failed. MESSAGE is `format` with each "%s"
-/// replaced by the next of `texts`, up to that text's first NUL byte; there are as many texts as
-/// "%s", at most two.
+/// where no call failed. MESSAGE is `format` with each "%s" replaced by the next of `texts`, up to
+/// that text's first NUL byte; there are as many texts as "%s", at most two.
 ///
 /// A handler that adds a message to a failure finds the number in errno: everything in this
-/// program that throws leaves it there, 0 where no call failed.
+/// program that throws sets it, to 0 where no call failed.
 ///
-/// Never called while a file or a directory is open: in a process started without standard error
-/// it may have that number, and the line would land in it.
+/// Never called while a file is open for writing, which only `write_file` does: in a process that
+/// was started without standard error, the line would be written into that file.
 ///
-/// Throws nothing, allocates nothing and leaves errno as it was; a write that fails is not
-/// reported anywhere.
+/// Throws nothing, allocates nothing and leaves errno as it was. A failed write is ignored.
 void report(int error, std::string_view format,
             std::initializer_list<const char*> texts = {}) noexcept;
 

@@ -11,18 +11,15 @@
 
 namespace {
 
-constexpr const char* default_zone = "America/Los_Angeles";
-
-/// Puts a link in the place of whatever can be replaced or removed there: unlike `fs::remove`, the
-/// C library's remove(3) takes an empty directory away too, and is silent where it fails.
+/// Unlike `fs::remove`, the C library's remove(3) removes an empty directory too, and is silent.
 void replace_localtime_link(const char* target) {
   if (fs::replace_symlink(target, paths::localtime_link, paths::new_localtime_link)) return;
   static_cast<void>(std::remove(paths::localtime_link));
   fs::create_symlink(target, paths::localtime_link);
 }
 
-/// Whether the link is good as it stands, or has been corrected. Where it is not, errno holds the
-/// number of the call that found out, or 0; the same when it throws.
+/// Whether the link is good or has been corrected. If not, or if this throws, errno is the number
+/// of the call that failed, or 0.
 bool keep_or_correct() {
   const std::string target = fs::read_symlink(paths::localtime_link);
   if (target.starts_with(paths::zoneinfo_link)) return true;
@@ -44,8 +41,8 @@ void repair_localtime_link() {
   try {
     if (keep_or_correct()) return;
   } catch (...) {
-    // Reported where it was thrown; like a link that points nowhere, it ends in the reset.
+    // Reported where it was thrown. The reset follows, as it does for a link that is not good.
   }
-  fs::report(errno, "localtime link invalid; resetting to %s", {default_zone});
+  fs::report(errno, "localtime link invalid; resetting to %s", {"America/Los_Angeles"});
   replace_localtime_link(paths::default_localtime);
 }

@@ -12,8 +12,8 @@
 
 namespace {
 
-/// Runs one stage. Nothing that leaves it ends the run: a failed call has been reported where it
-/// arose, there is no further fallback, and the stages behind it still do their work.
+/// Runs one stage. What it throws has been reported, has no further fallback, and must not keep the
+/// later stages from their work.
 void attempt(void (*stage)()) noexcept {
   try {
     stage();
@@ -21,8 +21,8 @@ void attempt(void (*stage)()) noexcept {
   }
 }
 
-/// Selects the active dataset, and falls back to the system copy whatever goes wrong. By then
-/// everything that the selection held has been released.
+/// Selects the active dataset, and falls back to the system copy whatever fails. By then everything
+/// that the selection held has been released.
 void select_dataset_or_reset() {
   try {
     select_dataset();
@@ -35,10 +35,10 @@ void select_dataset_or_reset() {
 }  // namespace
 
 int main(int /*count*/, char** /*arguments*/) {
-  // A closed pipe and a file-size limit are ordinary failed writes.
+  // A closed pipe and a file-size limit are then ordinary failed writes.
   static_cast<void>(std::signal(SIGPIPE, SIG_IGN));
   static_cast<void>(std::signal(SIGXFSZ, SIG_IGN));
-  // Reached where memory is lacking even for an exception; the next run starts from what is left.
+  // Called where there is no memory even for an exception.
   std::set_terminate([] { ::_exit(0); });
 
   attempt(prepare_storage);

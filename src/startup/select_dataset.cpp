@@ -1,22 +1,18 @@
 #include "startup/select_dataset.h"
 
-#include <unistd.h>
-
 #include <cerrno>
 #include <string>
 #include <utility>
 
 #include "dataset/vela_dataset.h"
 #include "fs/file.h"
-#include "fs/operations.h"
 #include "fs/report.h"
 #include "paths.h"
 #include "startup/dataset_links.h"
 
 namespace {
 
-/// The current dataset's path. Where the active link does not tell, resets to the system copy and
-/// gives that one's.
+/// The current dataset's path; after a failure to find it, that of the system copy, now active.
 std::string current_path_or_reset() {
   try {
     return current_dataset_path();
@@ -27,22 +23,13 @@ std::string current_path_or_reset() {
   }
 }
 
-/// Whether a run was killed while it activated a dataset: one at work is over in ten milliseconds.
-bool was_interrupted() noexcept {
-  for (int waits = 10; fs::exists(paths::switching_mark); --waits) {
-    if (waits == 0) return true;
-    ::usleep(1000);
-  }
-  return false;
-}
-
 }  // namespace
 
 void select_dataset() {
   const vela_dataset system;
   std::string latest_path = latest_dataset_path();
   const vela_dataset current(current_path_or_reset());
-  if (was_interrupted()) current.activate();
+  current.finish();
 
   const vela_dataset* baseline = &current;
   if (!current.compatible_schema(system) || system > current) {

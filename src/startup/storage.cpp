@@ -13,12 +13,10 @@
 namespace {
 
 void mark_unprotected(const char* path) noexcept {
-  constexpr int set_protection_class = 64;
-  constexpr int class_without_protection = 4;
+  constexpr int set_class = 64;
+  constexpr int without_protection = 4;
   const fs::descriptor directory(::open(path, O_RDONLY | O_CLOEXEC));
-  if (directory.is_open()) {
-    ::fcntl(directory.get(), set_protection_class, class_without_protection);
-  }
+  if (directory.is_open()) ::fcntl(directory.get(), set_class, without_protection);
 }
 
 }  // namespace
