@@ -1,7 +1,6 @@
 #pragma once
 
-/// The fixed paths of a run, absolute and not configurable. The names inside a copy of the data,
-/// such as "+VERSION", are in the code that reads them (`dataset/`).
+/// The fixed paths of a run. The names inside a copy of the data are in the code that reads them.
 namespace paths {
 
 // The system copy, shipped read-only with the operating system.

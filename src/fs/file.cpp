@@ -13,9 +13,13 @@
 namespace fs {
 namespace {
 
-/// Opens `path` unless something other than a regular file stands there. It asks before it opens,
-/// because opening alone can set a device to work; O_NONBLOCK is for an entry that changes between
-/// the two calls.
+// With fewer bits, calls fail on large inode numbers and on dates after 2038.
+static_assert(sizeof(off_t) == 8);
+static_assert(sizeof(ino_t) == 8);
+static_assert(sizeof(time_t) == 8);
+
+/// Opens `path` unless it is something other than a regular file: opening alone can set a device to
+/// work. O_NONBLOCK is for an entry that changes between the two calls.
 descriptor open_regular(const char* path, int flags) noexcept {
   constexpr mode_t new_file_mode = 0666;
   struct stat found {};

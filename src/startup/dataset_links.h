@@ -19,6 +19,6 @@
 /// an empty target, that of a missing link, and otherwise 0.
 [[nodiscard]] std::string dataset_path_from_link(const std::string& target);
 
-/// Makes the system copy, read afresh, the active one. Prints nothing of its own; throws what the
-/// construction and the activation of the system dataset throw.
+/// Makes the system copy, read afresh, the active one. Throws what building and activating it
+/// throw.
 void reset_to_system();

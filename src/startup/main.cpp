@@ -12,8 +12,7 @@
 
 namespace {
 
-/// Runs one stage. What it throws has been reported, has no further fallback, and must not keep the
-/// later stages from their work.
+/// Runs one stage. What it throws has been reported, and must not stop the later stages.
 void attempt(void (*stage)()) noexcept {
   try {
     stage();
@@ -21,8 +20,7 @@ void attempt(void (*stage)()) noexcept {
   }
 }
 
-/// Selects the active dataset, and falls back to the system copy whatever fails. By then everything
-/// that the selection held has been released.
+/// When the fallback begins, everything that the selection held has been released.
 void select_dataset_or_reset() {
   try {
     select_dataset();

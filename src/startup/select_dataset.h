@@ -5,7 +5,6 @@
 /// system copy, else resets to the system copy. Then switches to the newest download if that has
 /// the system copy's schema and is newer than the current dataset, and records the switch in
 /// "/var/db/timezone/TZVersionDiffRecord".
-///
 /// Handles a current link that cannot be read or understood (by a reset) and a record that cannot
 /// be written (by going on without it); throws on every other failure.
 /// Prints "Invalid current symlinks; resetting to system partition",
