@@ -41,14 +41,20 @@ bool vela_dataset::compatible_schema(const vela_dataset& other) const {
 }
 
 void vela_dataset::activate() const {
-  // First of all, and for the system copy as well, which has no ICU link: if this run is killed
-  // between the components, the next one sees by this link what to finish.
-  static_cast<void>(fs::stage_symlink(icu_directory(path).c_str(), paths::new_icu_link));
+  const std::string tree = zoneinfo_directory(path);
+  const std::string icu = icu_directory(path);
+  // Both are staged before either link changes. The ICU link is staged for the system copy as well,
+  // which has none: if this run is killed in between, the next one sees by it what to finish.
+  if (fs::stage_symlink(tree.c_str(), paths::new_zoneinfo_link) &&
+      !fs::stage_symlink(icu.c_str(), paths::new_icu_link) && !path.empty()) {
+    fs::require_room(icu.c_str(), paths::icu_link);
+  }
   try {
     for (const auto& component : components) component->activate();
   } catch (...) {
     const int error = errno;
-    ::unlink(paths::new_icu_link);
+    // Without room, the staged link may be the only sign of what is not finished.
+    if (error != ENOSPC && error != EDQUOT) ::unlink(paths::new_icu_link);
     errno = error;
     throw;
   }

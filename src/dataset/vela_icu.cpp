@@ -25,11 +25,7 @@ bool is_public_file(DIR* directory, const char* name) noexcept {
 
 /// The schema of the first data file in a download's directory; empty where there is none.
 std::string find_schema(const char* path) {
-  const std::unique_ptr<DIR, void (*)(DIR*)> directory(::opendir(path), [](DIR* opened) {
-    const int error = errno;  // that of a failure on its way to a handler
-    ::closedir(opened);
-    errno = error;
-  });
+  const std::unique_ptr<DIR, int (*)(DIR*)> directory(::opendir(path), ::closedir);
   if (directory == nullptr) {
     if (errno != ENOMEM) return {};
     fs::report(ENOMEM, "tz_icu::initialize: fts_open of %s failed, %s",
@@ -69,12 +65,11 @@ vela_icu::vela_icu(const std::string& path)
 }
 
 void vela_icu::initialize() {
-  if (dataset_path.empty()) {
-    schema = fs::read_first_word((icu_path + "/icutzformat.txt").c_str());
-    return;
-  }
-  schema = find_schema(icu_path.c_str());
-  if (schema.empty()) fs::report(0, "No ICU schema found for %s", {dataset_path.c_str()});
+  const bool is_download = !dataset_path.empty();
+  schema = is_download ? find_schema(icu_path.c_str())
+                       : fs::read_first_word((icu_path + "/icutzformat.txt").c_str());
+  if (is_download && schema.empty())
+    fs::report(0, "No ICU schema found for %s", {dataset_path.c_str()});
 }
 
 bool vela_icu::compatible_schema(const vela_dataset_component& other) const {

@@ -26,9 +26,8 @@ class vela_icu final : public vela_dataset_component {
  private:
   /// Finds the schema: the first word of the system copy's "icutzformat.txt", or, for a download,
   /// that in the name of the first data file listed in its directory: a regular file, readable by
-  /// others. A download without one prints "No ICU schema found for %s", whatever the reason.
-  /// Without memory for reading the directory, prints "tz_icu::initialize: fts_open of %s failed,
-  /// %s" and throws `int`.
+  /// others. A download without one prints "No ICU schema found for %s". Without memory for reading
+  /// the directory, prints "tz_icu::initialize: fts_open of %s failed, %s" and throws `int`.
   void initialize();
 
   std::string schema;

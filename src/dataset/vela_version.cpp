@@ -10,21 +10,19 @@
 
 namespace {
 
-constexpr std::string_view digits = "0123456789";
-
 /// Cuts the longest run of bytes that are among `allowed` off the front of `rest`; may be empty.
-std::string_view take_run(std::string_view& rest, std::string_view allowed) {
+std::string_view take_run(std::string_view& rest, std::string_view allowed = "0123456789") {
   const std::string_view run = rest.substr(0, rest.find_first_not_of(allowed));
   rest.remove_prefix(run.size());
   return run;
 }
 
-/// Cuts a dot and the digits behind it off the front of `rest` and gives the digits; cuts nothing
-/// and gives the empty text when there is no dot with a digit behind it.
+/// Cuts a dot and digits off the front of `rest` and gives the digits; nothing if either is
+/// missing.
 std::string_view take_dotted_number(std::string_view& rest) {
   if (!rest.starts_with('.')) return {};
   std::string_view behind_dot = rest.substr(1);
-  const std::string_view number = take_run(behind_dot, digits);
+  const std::string_view number = take_run(behind_dot);
   if (!number.empty()) rest = behind_dot;
   return number;
 }
@@ -45,7 +43,7 @@ std::int32_t to_number(std::string_view number) {
 // ([0-9]+)([a-z]+)(?:\.([0-9]+))?(?:\.([0-9]+))?
 void vela_version::parse(const std::string& text) {
   std::string_view rest = text;
-  const std::string_view year_digits = take_run(rest, digits);
+  const std::string_view year_digits = take_run(rest);
   const std::string_view letter_run = take_run(rest, "abcdefghijklmnopqrstuvwxyz");
   const std::string_view major_digits = take_dotted_number(rest);
   const std::string_view minor_digits = take_dotted_number(rest);

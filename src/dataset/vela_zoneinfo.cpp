@@ -1,7 +1,5 @@
 #include "dataset/vela_zoneinfo.h"
 
-#include <unistd.h>
-
 #include <cerrno>
 
 #include "fs/file.h"
@@ -9,9 +7,13 @@
 #include "fs/report.h"
 #include "paths.h"
 
+std::string zoneinfo_directory(const std::string& dataset_path) {
+  return dataset_path.empty() ? paths::system_zoneinfo : dataset_path + "/zoneinfo";
+}
+
 vela_zoneinfo::vela_zoneinfo(const std::string& path)
     : vela_dataset_component(path),
-      zoneinfo_path(path.empty() ? paths::system_zoneinfo : path + "/zoneinfo"),
+      zoneinfo_path(zoneinfo_directory(path)),
       version_text(fs::read_first_word((zoneinfo_path + "/+VERSION").c_str())) {}
 
 void vela_zoneinfo::activate() const {
@@ -22,6 +24,5 @@ void vela_zoneinfo::activate() const {
   } catch (...) {
     fs::report(errno, "Unlink of zoneinfo softlink failed");
   }
-  ::unlink(paths::new_icu_link);  // on a full storage, the last room
   fs::create_symlink(tree, paths::zoneinfo_link);
 }

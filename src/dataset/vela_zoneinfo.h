@@ -29,3 +29,6 @@ class vela_zoneinfo final : public vela_dataset_component {
   const std::string zoneinfo_path;
   const std::string version_text;
 };
+
+/// The tree of the dataset in the directory `dataset_path`, the system copy's for the empty one.
+[[nodiscard]] std::string zoneinfo_directory(const std::string& dataset_path);

@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cstddef>
 #include <new>
 
 #include "fs/descriptor.h"
@@ -27,13 +28,10 @@ descriptor open_regular(const char* path, int flags) noexcept {
   return descriptor(::open(path, flags | O_CLOEXEC | O_NONBLOCK, new_file_mode));
 }
 
-bool is_blank(char byte) noexcept {
-  return byte == ' ' || (byte >= '\t' && byte <= '\r');
-}
-
 /// The first word read from an open descriptor; may throw std::bad_alloc.
 std::string first_word(int file) {
   constexpr ssize_t limit = 64L << 20;
+  constexpr std::string_view blanks = " \t\n\v\f\r";
   std::string word;
   std::array<char, 4096> block;
   for (ssize_t total = 0; total < limit;) {
@@ -41,12 +39,11 @@ std::string first_word(int file) {
     if (count < 0) break;
     if (count == 0) return word;
     total += count;
-    const char* begin = block.data();
-    const char* const end = begin + count;
-    if (word.empty()) begin = std::find_if_not(begin, end, is_blank);
-    const char* const word_end = std::find_if(begin, end, is_blank);
-    word.append(begin, word_end);
-    if (word_end != end) return word;
+    std::string_view text(block.data(), static_cast<std::size_t>(count));
+    if (word.empty()) text.remove_prefix(std::min(text.find_first_not_of(blanks), text.size()));
+    const std::size_t end = text.find_first_of(blanks);
+    word.append(text.substr(0, end));
+    if (end != std::string_view::npos) return word;
   }
   return {};
 }

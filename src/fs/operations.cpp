@@ -7,6 +7,7 @@
 #include <cerrno>
 #include <climits>
 #include <cstddef>
+#include <cstdio>
 #include <initializer_list>
 #include <string_view>
 
@@ -16,18 +17,16 @@
 namespace fs {
 namespace {
 
-/// Whether the full storage has room for a link once another one is removed: it has run out of
-/// inodes, and is one of the file systems that can use a freed inode at once. Others let a link be
-/// removed and then refuse to make one: btrfs, and XFS even where it counts no free inode.
+/// Whether the storage is a file system that can use a freed inode at once, and has none left.
 bool removing_makes_room() noexcept {
   constexpr long tmpfs = 0x01021994;
   constexpr long ext4 = 0xef53;
   const int error = errno;
-  struct statfs found {};
-  const bool known = ::statfs(paths::storage, &found) == 0;
+  struct statfs storage {};
+  const bool known = ::statfs(paths::storage, &storage) == 0;
   errno = error;
-  return known && (found.f_type == tmpfs || found.f_type == ext4) && found.f_files > 0 &&
-         found.f_ffree == 0;
+  return known && (storage.f_type == tmpfs || storage.f_type == ext4) && storage.f_files > 0 &&
+         storage.f_ffree == 0;
 }
 
 /// Reports the call that has just failed and throws its error number.
@@ -35,10 +34,6 @@ bool removing_makes_room() noexcept {
   const int error = errno;
   report(error, format, texts);
   throw int{error};
-}
-
-[[noreturn]] void fail_to_link(const char* target, const char* link) {
-  fail("create_symlink: from %s to %s", {link, target});
 }
 
 }  // namespace
@@ -60,28 +55,36 @@ std::string read_symlink(const char* path) {
 }
 
 void create_symlink(const char* target, const char* link) {
-  if (::symlink(target, link) != 0) fail_to_link(target, link);
+  if (::symlink(target, link) != 0) fail("create_symlink: from %s to %s", {link, target});
 }
 
 bool is_symlink_to(const char* target, const char* link) noexcept {
+  const int error = errno;
   std::array<char, PATH_MAX> content;
   const ssize_t length = ::readlink(link, content.data(), content.size());
+  errno = error;
   return length >= 0 &&
          std::string_view(content.data(), static_cast<std::size_t>(length)) == target;
 }
 
 bool stage_symlink(const char* target, const char* staged) noexcept {
   if (::symlink(target, staged) == 0 || is_symlink_to(target, staged)) return true;
-  ::unlink(staged);
-  return ::symlink(target, staged) == 0;
+  std::remove(staged);
+  return ::symlink(target, staged) == 0 || is_symlink_to(target, staged);
+}
+
+void require_room(const char* target, const char* link) {
+  if ((errno == ENOSPC || errno == EDQUOT) && !removing_makes_room())
+    fail("create_symlink: from %s to %s", {link, target});
 }
 
 bool replace_symlink(const char* target, const char* link, const char* staged) {
   if (stage_symlink(target, staged)) {
-    return ::rename(staged, link) == 0 ||
-           (::unlink(staged) != 0 && errno == ENOENT);  // another run has renamed it
+    if (::rename(staged, link) == 0) return true;
+    if (errno == ENOENT && is_symlink_to(target, link)) return true;  // another run renamed it
   }
-  if ((errno == ENOSPC || errno == EDQUOT) && !removing_makes_room()) fail_to_link(target, link);
+  require_room(target, link);
+  ::unlink(staged);
   return false;
 }
 

@@ -27,21 +27,27 @@ void remove(const char* path);
 /// On failure prints "create_symlink: from %s to %s" (the link's path first) and throws `int`.
 void create_symlink(const char* target, const char* link);
 
-/// Whether `link` is a link with exactly the content `target`. Prints and throws nothing.
+/// Whether `link` is a link with exactly the content `target`. Prints and throws nothing, and
+/// leaves errno as it was.
 [[nodiscard]] bool is_symlink_to(const char* target, const char* link) noexcept;
 
 /// Makes sure that a link with the content `target` is at `staged`, the name beside a link that is
-/// to be replaced. One with that content may be there already, from another run; any other entry
-/// that is no directory is removed first.
+/// to be replaced. One with that content may be there already, from another run; any other file or
+/// link and an empty directory are removed first.
 /// False where the link cannot be made, with the number in errno. Prints and throws nothing.
 [[nodiscard]] bool stage_symlink(const char* target, const char* staged) noexcept;
 
+/// To be called when a link could not be staged or renamed. If errno says that the storage is full,
+/// prints "create_symlink: from %s to %s" and throws `int`: a link that is removed may make no
+/// room. Not on tmpfs and ext4 without a free inode, where it does. XFS refuses a link then all the
+/// same.
+void require_room(const char* target, const char* link);
+
 /// Replaces the link or file at `link`, if any, by a link with the content `target`, in one step:
 /// every reader finds the old entry or the new link. The new link is staged at `staged` and renamed
-/// to `link`; where another run renames it first, that run has the last word.
-/// False where this cannot be done (a directory is at `link`, for example); `link` is unchanged.
-/// Where the storage is full and removing a link would not make room for one, prints
-/// "create_symlink: from %s to %s" and throws `int`, so that nobody removes `link`.
+/// to `link`; where another run renames it first, that is as good.
+/// False where this cannot be done (a directory is at `link`, for example): `link` is unchanged,
+/// and nothing is at `staged`. Throws what `require_room` throws; both are unchanged then.
 [[nodiscard]] bool replace_symlink(const char* target, const char* link, const char* staged);
 
 }  // namespace fs

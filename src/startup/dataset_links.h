@@ -19,6 +19,5 @@
 /// an empty target, that of a missing link, and otherwise 0.
 [[nodiscard]] std::string dataset_path_from_link(const std::string& target);
 
-/// Makes the system copy, read afresh, the active one. Throws what building and activating it
-/// throw.
+/// Makes the system copy, read afresh, the active one. Throws what its `activate` throws.
 void reset_to_system();

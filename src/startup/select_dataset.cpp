@@ -30,7 +30,6 @@ void select_dataset() {
   std::string latest_path = latest_dataset_path();
   const vela_dataset current(current_path_or_reset());
   current.finish();
-
   const vela_dataset* baseline = &current;
   if (!current.compatible_schema(system) || system > current) {
     fs::report(0, "Symlink points at data incompatible with installed system");

@@ -1,16 +1,15 @@
 #pragma once
 
-// The stages that put the storage in order before any dataset is looked at. Each prints nothing
-// when all goes well, and lets no file-system failure out.
+// The stages that prepare the storage before any dataset is read. Each prints nothing when nothing
+// is wrong, and throws nothing for a failed system call.
 
 /// Gives "/var/db/timezone/" and "/var/db/timezone/tz/" the data-protection class without
-/// protection, on platforms that have such classes; others refuse the request, and nothing comes of
-/// it. A directory that cannot be opened is passed over.
+/// protection, where the platform has such classes. Skips a directory that cannot be opened.
 void prepare_storage();
 
 /// Copies the legacy link "/var/db/icutz" to "/var/db/timezone/icutz" when only the legacy one
-/// exists, then removes the legacy one whatever became of the copy. A link exists when its target
-/// does: one whose target is missing stays.
+/// exists, then removes the legacy one even if that failed. A link exists when its target does: one
+/// whose target is missing is not removed.
 /// Prints "Could not migrate /var/db/icutz to /var/db/timezone/icutz" and
 /// "Could not remove /var/db/icutz".
 void migrate_legacy_icutz();
