@@ -28,8 +28,8 @@ class vela_dataset {
   /// Not symmetric: this dataset's components are asked.
   [[nodiscard]] bool compatible_schema(const vela_dataset& other) const;
 
-  /// Makes this copy the active one: zoneinfo first, then ICU. Meanwhile,
-  /// "/var/db/timezone/icutz.new" is a link to its ICU data. What a component throws ends it.
+  /// Makes this copy the active one: zoneinfo first, then ICU. Where it can be made, a link to the
+  /// ICU data is at "/var/db/timezone/icutz.new" meanwhile. What a component throws ends it.
   void activate() const;
 
   /// Completes an activation of this dataset that was killed after the zoneinfo link: activates the

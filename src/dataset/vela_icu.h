@@ -19,8 +19,8 @@ class vela_icu final : public vela_dataset_component {
 
   /// For a download, replaces "/var/db/timezone/icutz" by a link to this directory, in one step or
   /// by a removal and a creation; for the system copy, removes it. Then removes the legacy
-  /// "/var/db/icutz". After a removal that fails, prints "unlink of ICU softlink failed" and makes
-  /// no other. Throws `int` when the link cannot be created.
+  /// "/var/db/icutz", unless the other removal failed; prints "unlink of ICU softlink failed" after
+  /// either. Throws `int` when the link cannot be created. "icutz.new" is gone then, without room not.
   void activate() const override;
 
  private:
@@ -34,8 +34,7 @@ class vela_icu final : public vela_dataset_component {
   const std::string icu_path;
 };
 
-/// The ICU data of the dataset in the directory `dataset_path`, the system copy's for the empty
-/// one.
+/// The ICU data of the dataset at `dataset_path`, the system copy's for the empty path.
 [[nodiscard]] std::string icu_directory(const std::string& dataset_path);
 
 /// The schema in the name of an ICU data file, 44l for icutz44l.dat; empty for any other name.

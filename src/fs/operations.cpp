@@ -7,7 +7,6 @@
 #include <cerrno>
 #include <climits>
 #include <cstddef>
-#include <cstdio>
 #include <initializer_list>
 #include <string_view>
 
@@ -69,7 +68,8 @@ bool is_symlink_to(const char* target, const char* link) noexcept {
 
 bool stage_symlink(const char* target, const char* staged) noexcept {
   if (::symlink(target, staged) == 0 || is_symlink_to(target, staged)) return true;
-  std::remove(staged);
+  if (errno != EEXIST) return false;
+  ::unlink(staged);
   return ::symlink(target, staged) == 0 || is_symlink_to(target, staged);
 }
 

@@ -33,7 +33,7 @@ void create_symlink(const char* target, const char* link);
 
 /// Makes sure that a link with the content `target` is at `staged`, the name beside a link that is
 /// to be replaced. One with that content may be there already, from another run; any other file or
-/// link and an empty directory are removed first.
+/// link is removed first.
 /// False where the link cannot be made, with the number in errno. Prints and throws nothing.
 [[nodiscard]] bool stage_symlink(const char* target, const char* staged) noexcept;
 
