@@ -1,0 +1,39 @@
+#pragma once
+
+#include <filesystem>
+#include <string>
+
+#include "dataset/vela_version.h"
+
+// The copies of the data and the links to them, as a run finds them. The path of a copy is the
+// directory of a download, or the empty text for the system copy.
+
+namespace files = std::filesystem;
+
+/// A copy, and why a run could not use it.
+struct copy {
+  std::string path;
+  std::string version_text = {};  // the path itself where it is that of no download
+  vela_version version = {};      // unknown where the text is no version
+  std::string fault = {};         // empty where a run can use the copy
+  bool ends_run = false;  // whether a run that reads it goes back to the system copy at once
+};
+
+/// The copy at `path`. Prints what `vela_icu` prints; throws what its constructor throws.
+[[nodiscard]] copy examine(const std::string& path);
+
+/// The copy that the zoneinfo link names. Where it names none, the path is that of no copy, and the
+/// version is that of the system copy, by which a run goes on.
+[[nodiscard]] copy active_copy();
+
+/// Whether both the zoneinfo and the ICU link are those of the copy at `path`.
+[[nodiscard]] bool is_active(const std::string& path);
+
+/// The target of a link; empty where there is no link or it cannot be read.
+[[nodiscard]] std::string target_of(const char* link);
+
+/// The name of the local zone, such as Europe/Paris; empty where the link names none.
+[[nodiscard]] std::string local_zone();
+
+/// The file whose first word is the system copy's schema, such as 44l.
+inline constexpr const char* schema_file = "/usr/share/icu/icutzformat.txt";
