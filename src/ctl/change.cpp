@@ -3,6 +3,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <iostream>
 #include <map>
 #include <set>
@@ -61,14 +62,15 @@ void add_download(const workplace& place, const files::path& directory, const st
   files::rename(made, path);
 }
 
-/// Starts a run of kestrel, by the service manager where there is one, and waits for its end.
+/// Starts a run of kestrel, by the service manager where there is one, and waits for its end. Else
+/// kestrel is found as this program was: beside it, or in the PATH.
 void run_kestrel() {
-  const std::string beside = files::read_symlink("/proc/self/exe").replace_filename("kestrel");
+  const std::string beside = files::path(program_invocation_name).replace_filename("kestrel");
   const pid_t run = ::fork();
   if (run == 0 && ::seteuid(::getuid()) == 0 && ::setegid(::getgid()) == 0) {
     if (files::exists("/run/systemd/system"))
       ::execlp("systemctl", "systemctl", "start", "kestrel.service", nullptr);
-    ::execl(beside.c_str(), "kestrel", nullptr);
+    ::execlp(beside.c_str(), "kestrel", nullptr);
   }
   if (run == 0) ::_exit(1);
   ::waitpid(run, nullptr, 0);
