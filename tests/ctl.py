@@ -48,8 +48,7 @@ def test_publish_and_back():
     for _ in range(2):
         done = ctl("publish 2026b.1.0 DIR")
         assert (done.returncode, done.stdout) == (0, "2026b.1.0 is active\n"), done.stderr
-    wanted = {"/": 0o755, "=": 0o644, ">": 0o777}
-    assert all(os.lstat(path).st_mode & 0o777 == wanted[kind[0]]
+    assert all(os.lstat(path).st_mode & 0o777 == {"/": 0o755, "=": 0o644, ">": 0o777}[kind[0]]
                for path, kind in kinds() if "/2026b.1.0/" in path)
     assert ctl("status").stdout == (
         "active: 2026b.1.0\nzoneinfo: /var/db/timezone/tz/2026b.1.0/zoneinfo\nsystem: 2026a.1.0\n"
@@ -62,6 +61,8 @@ def test_publish_and_back():
     before = found()
     subprocess.run(KESTREL, check=True, stderr=subprocess.DEVNULL)
     assert found() == before
+    subprocess.run("ln -sfn zoneinfo/Asia/Tokyo localtime", shell=True, cwd=STORAGE, check=True)
+    assert "leads to no whole zone" in ctl("status").stderr
 
 
 # What is wrong with a version, or with what was fetched after a shell's command in its directory.
@@ -70,11 +71,16 @@ def test_publish_and_back():
     ("2026c.2147483648", ":", "no version, or has a number above"),
     ("../2026c", ":", "no version, or has a number above"),
     ("2026b.1.0", "echo >>zoneinfo/+VERSION", "2026b.1.0 has other content"),
-    ("2026c", "mv icutz/icutz44l.dat icutz/icutz44b.dat", "schema by icutz44l.dat"),
+    ("2026c", "mv icutz/icutz44l.dat icutz/icutz44b.dat", "no schema by icutz/icutz44l.dat"),
     ("2026c", "rm icutz/metaZones.res", "icutz/metaZones.res is missing or not whole"),
     ("2026c", "truncate -s 100 zoneinfo/Asia/Tokyo", "the local zone, is missing or not whole"),
     ("2026c", "rm zoneinfo/+VERSION", "zoneinfo/+VERSION is missing"),
-    ("2026c", ": >zoneinfo/Etc/UTC", "zoneinfo/Etc/UTC is not whole"),
+    ("2026c", ": >zoneinfo/+VERSION", "zoneinfo/+VERSION is not whole"),
+    ("2026c", "echo x >zoneinfo/Etc/UTC", "zoneinfo/Etc/UTC is not whole"),
+    ("2026c", "mv zoneinfo/Etc .; ln -s ../Etc zoneinfo", "zoneinfo/Etc is missing"),
+    ("2026c", "ln -sf /tmp/fetched/zoneinfo/Asia/Tokyo zoneinfo/Etc/UTC", "Etc/UTC is missing"),
+    ("2026c", "rm zoneinfo/Etc/UTC; mkdir zoneinfo/Etc/UTC", "zoneinfo/Etc/UTC is missing"),
+    ("2026c", "mv icutz/metaZones.res .; ln -s $PWD/metaZones.res icutz", "icutz/metaZones.res is missing"),
     ("2026c", "head -c 60 zoneinfo/Etc/UTC >zoneinfo/New", "zoneinfo/New is not whole"),
     ("2026c", "mkfifo zoneinfo/New", "zoneinfo/New is not whole"),
 ])
@@ -106,9 +112,9 @@ def test_interrupted(fault):
 
 
 def test_two_at_once():
-    delay = [*TRACER, "-e", "inject=syncfs:delay_enter=500000:when=1"]
-    first = subprocess.Popen([*delay, KESTREL + "ctl", "publish", "2026b.1.0", FETCHED])
-    while not (STORAGE / "tz/.kestrelctl/download/icutz").exists():
+    first = subprocess.Popen([*TRACER, "-e", "inject=syncfs:delay_enter=500000:when=1",
+                              KESTREL + "ctl", "publish", "2026b.1.0", FETCHED])
+    while first.poll() is None and not (STORAGE / "tz/.kestrelctl/download/icutz").exists():
         pass
     for line in ("publish 2026b.1.0 DIR", "back", "prune"):
         assert "another kestrelctl is at work" in ctl(line).stderr
@@ -120,7 +126,9 @@ def test_storage_of_another_user():
                    check=True)
     assert ctl("publish 2026b.1.0 DIR").returncode == 0
     assert {os.stat(path).st_uid for path in (STORAGE / "tz").rglob("*")} == {1234}
-    for line, said in (("publish 2026c.1.0 DIR", "2026c.1.0 is published: the next run of kestrel"),
+    for line, said in (("publish 2026c.1.0 DIR", "2026c.1.0 waits for the next run of kestrel"),
                        ("back", "2026a.1.0 is active"), ("prune", "removed")):
         assert said in ctl(line, "setpriv", "--reuid=1234", "--clear-groups").stdout
     assert "Permission denied" in ctl("prune", "setpriv", "--reuid=4321").stderr
+    subprocess.run("rmdir tz; ln -s /usr/share tz", shell=True, cwd=STORAGE, check=True)
+    assert "Permission denied" in ctl("prune").stderr

@@ -90,7 +90,6 @@ def traced():
     for world, allowed in (("everything_at_once", []), ("older_and_no_newer", ["icutz"])):
         removed = [match[1] for line, _, _ in calls(world) if (match := REMOVED.match(line))]
         assert removed == allowed, f"{world}: removed {removed}"
-    print("the storage is marked, a line is written at once, no link is removed without need")
 
 
 # Delayed runs at once. Only the download has the local zone, so that no run may go back from it.

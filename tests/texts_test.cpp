@@ -25,8 +25,8 @@ vela_version parsed(const std::string& text) {
 
 class Files : public testing::Test {
  protected:
-  Files() { EXPECT_NE(::mkdtemp(folder.data()), nullptr); }
-  ~Files() override { std::filesystem::remove_all(folder); }
+  void SetUp() override { ASSERT_NE(::mkdtemp(folder.data()), nullptr); }
+  void TearDown() override { std::filesystem::remove_all(folder); }
   std::string folder = testing::TempDir() + "kestrel-XXXXXX";
 };
 
@@ -74,9 +74,8 @@ TEST(Texts, VersionOrder) {
   const char* const ascending[] = {"none",    "999z",      "2022a",     "2022a.0", "2022a.0.0",
                                    "2022a.1", "2022a.1.0", "2022a.1.1", "2022a.9", "2022a.10",
                                    "2022ab",  "2022z",     "2022za",    "2022zz",  "2023a"};
-  for (const auto& a : ascending) {
+  for (const auto& a : ascending)
     for (const auto& b : ascending) EXPECT_EQ(parsed(a) > parsed(b), &a > &b) << a << " > " << b;
-  }
 }
 
 TEST_F(Files, AndLinksAreReadUpToALimit) {
@@ -99,10 +98,10 @@ TEST_F(Files, TheFirstFitFileOfADirectoryCounts) {
   std::filesystem::create_directories(folder + "/all/icutz");
   std::filesystem::create_directories(folder + "/one/icutz");
   for (const char* name : {"a.res", "icutz44l.dat", "icutz44b.dat", "icutz44e.dat", "z.res"})
-    std::ofstream(folder + "/all/icutz/" + name);
+    std::ofstream(folder + "/all/icutz/" + name) << name;
   for (const auto& item : std::filesystem::directory_iterator(folder + "/all/icutz"))
     if (first.empty()) first = data_file_schema(item.path().filename().c_str());
-  std::ofstream(folder + "/one/icutz/icutz" + first + ".dat");
+  std::ofstream(folder + "/one/icutz/icutz" + first + ".dat") << first;
   EXPECT_TRUE(vela_icu(folder + "/all").compatible_schema(vela_icu(folder + "/one"))) << first;
 }
 
@@ -116,7 +115,7 @@ TEST(Whole, Zones) {
       EXPECT_FALSE(is_whole_zone(zone.substr(0, size))) << name << ' ' << size;
   }
   std::string first_version = "TZif" + std::string(32, '\0') + std::string("\0\0\0\1\0\0\0\4", 8);
-  first_version += std::string(6, '\0') + std::string("UTC", 4);
+  first_version += std::string(6, '\0') + std::string("UTC\0", 4);
   EXPECT_TRUE(is_whole_zone(first_version));
 }
 
@@ -134,11 +133,7 @@ TEST(Whole, Bundles) {
 
 TEST(Components, OnlyZoneinfoServesInAnyPlace) {
   EXPECT_TRUE(vela_zoneinfo().compatible_schema(vela_icu()));
-  testing::internal::CaptureStderr();
   EXPECT_FALSE(vela_icu().compatible_schema(vela_zoneinfo()));
-  EXPECT_EQ(
-      testing::internal::GetCapturedStderr(),
-      "kestrel: vela_icu::compatible_schema: could not dynamic_cast other component: Success\n");
 }
 
 }  // namespace

@@ -10,19 +10,21 @@
 
 namespace files = std::filesystem;
 
-/// A copy, and why a run could not use it.
+/// A copy, as a run compares it, and what is wrong with it.
 struct copy {
   std::string path;
   std::string version_text = {};  // the path itself where it is that of no download
   vela_version version = {};      // unknown where the text is no version
-  std::string fault = {};         // empty where a run can use the copy
+  std::string fault = {};         // empty where the copy can be used
+  bool fits = false;              // whether its schema is the system copy's
   bool ends_run = false;  // whether a run that reads it goes back to the system copy at once
 };
 
-/// The copy at `path`. Prints what `vela_icu` prints; throws what its constructor throws.
+/// The copy at `path`. Prints what `vela_version::parse` and `vela_icu` print; throws what the
+/// constructor of the latter throws.
 [[nodiscard]] copy examine(const std::string& path);
 
-/// The copy that the zoneinfo link names. Where it names none, the path is that of no copy, and the
+/// The copy that the zoneinfo link names. Where it names none, path and text are "none", and the
 /// version is that of the system copy, by which a run goes on.
 [[nodiscard]] copy active_copy();
 
@@ -32,7 +34,7 @@ struct copy {
 /// The target of a link; empty where there is no link or it cannot be read.
 [[nodiscard]] std::string target_of(const char* link);
 
-/// The name of the local zone, such as Europe/Paris; empty where the link names none.
+/// The name of the local zone, such as Europe/Paris; empty where a run would set another.
 [[nodiscard]] std::string local_zone();
 
 /// The file whose first word is the system copy's schema, such as 44l.

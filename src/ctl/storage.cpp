@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <iostream>
 #include <stdexcept>
 #include <system_error>
 
@@ -19,10 +20,12 @@ void check(bool done, const char* path) {
 }
 
 int open_workplace() {
-  struct stat storage {};
-  check(::stat(paths::downloads, &storage) == 0 &&
-            (::getuid() != 0 || (::setegid(storage.st_gid) == 0 && ::seteuid(storage.st_uid) == 0)),
-        paths::downloads);
+  struct stat owned {};
+  for (const char* const place : {paths::storage, paths::downloads}) {
+    check(::stat(place, &owned) == 0, place);
+    if (::geteuid() == 0)
+      check(::setegid(owned.st_gid) == 0 && ::seteuid(owned.st_uid) == 0, place);
+  }
   check(::mkdir(workplace::path, S_IRWXU) == 0 || errno == EEXIST, workplace::path);
   return ::open(workplace::path, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
 }
@@ -36,7 +39,8 @@ workplace::workplace() : directory(open_workplace()) {
   if (::flock(directory.get(), LOCK_EX | LOCK_NB) != 0 || ::fstat(directory.get(), &locked) != 0 ||
       locked.st_nlink == 0)
     throw std::runtime_error("another kestrelctl is at work: start again when it has ended");
-  for (const auto& entry : files::directory_iterator(path)) files::remove_all(entry);
+  for (const auto& entry : files::directory_iterator(path)) remove_and_say(entry);
+  remove_and_say(new_latest_link);
 }
 
 workplace::~workplace() {
@@ -47,6 +51,10 @@ workplace::~workplace() {
 
 void workplace::sync() const {
   check(::syncfs(directory.get()) == 0, path);
+}
+
+void remove_and_say(const files::path& path) {
+  if (files::remove_all(path) > 0) std::cout << "removed " << path.string() << '\n';
 }
 
 void name_newest(const std::string& path) {

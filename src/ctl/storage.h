@@ -11,10 +11,10 @@ class workplace final {
  public:
   static constexpr const char* path = "/var/db/timezone/tz/.kestrelctl";
 
-  /// Takes the lock and empties the directory. As root, the program goes on as the owner of the
-  /// storage: then nothing that this owner has put there leads to a file of root's, and the owner
-  /// can remove what is made. Throws std::runtime_error where another command has the lock, and
-  /// std::system_error where the directory cannot be made or used.
+  /// Takes the lock, and removes and prints what a killed command left. As root, the program goes
+  /// on as the owner of the storage: then nothing that this owner has put there leads to a file of
+  /// root's, and the owner can remove what is made. Throws std::runtime_error where another command
+  /// has the lock, and std::system_error where the directory cannot be made or used.
   workplace();
 
   /// Removes the directory with all that is in it, and a tz_latest that was staged.
@@ -32,6 +32,10 @@ class workplace final {
 
 /// The name under which a new tz_latest is staged.
 inline constexpr const char* new_latest_link = "/var/db/timezone/tz_latest.new";
+
+/// Removes what is at `path`, with all that is in it, and prints its path on standard output; does
+/// nothing where there is nothing. Throws std::system_error on failure.
+void remove_and_say(const files::path& path);
 
 /// Makes tz_latest name the download at `path`, in one step or by a removal and a creation; removes
 /// it for the empty path. Throws `int` where that fails; the library has printed it.

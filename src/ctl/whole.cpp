@@ -1,6 +1,5 @@
 #include "ctl/whole.h"
 
-#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <fstream>
@@ -14,10 +13,9 @@ namespace {
 
 /// The number in the bytes at a place, which are all there.
 std::uint64_t number_at(std::string_view bytes, std::size_t place, std::size_t size, bool big) {
-  std::string ordered(bytes.substr(place, size));
-  if (!big) std::ranges::reverse(ordered);
   std::uint64_t number = 0;
-  for (const char byte : ordered) number = number << 8 | static_cast<unsigned char>(byte);
+  for (std::size_t i = 0; i < size; ++i)
+    number = number << 8 | static_cast<unsigned char>(bytes[place + (big ? i : size - 1 - i)]);
   return number;
 }
 
@@ -32,6 +30,10 @@ bool take_block(std::string_view& zone, std::size_t time_size) {
   if (count(4) == 0 || length > zone.size()) return false;
   zone.remove_prefix(static_cast<std::size_t>(length));
   return true;
+}
+
+bool leads_out(const files::path& path) {
+  return files::is_symlink(path) && files::read_symlink(path).is_absolute();
 }
 
 }  // namespace
@@ -58,12 +60,13 @@ bool is_whole_bundle(std::string_view bundle) {
 std::string content_of(const files::path& path) {
   std::error_code error;
   std::ifstream file;
-  if (files::is_regular_file(path, error)) file.open(path, std::ios::binary);
+  if (files::is_regular_file(path, error) && files::file_size(path, error) < 64U << 20)
+    file.open(path, std::ios::binary);
   return {std::istreambuf_iterator<char>(file), {}};
 }
 
 bool complain(const std::string& fault) {
-  std::cerr << "kestrelctl: " << fault << '\n';
+  std::cerr << "kestrelctl: " << fault.substr(0, fault.find('\n')) << '\n';
   return false;
 }
 
@@ -76,22 +79,23 @@ bool is_complete(const files::path& directory) {
     const std::string expected = content_of(system / entry.path().lexically_relative(zoneinfo));
     const std::string content = content_of(entry);
     const bool is_zone = content.starts_with("TZif") || expected.starts_with("TZif");
-    if (content.empty() || (is_zone && !is_whole_zone(content)))
-      is_good = complain(entry.path().string() + " is not whole");
+    is_good &= (is_zone ? is_whole_zone(content) : !content.empty()) ||
+               complain(entry.path().string() + " is not whole");
   }
   for (files::recursive_directory_iterator entry(system), end; entry != end; ++entry) {
     const files::path file = zoneinfo / entry->path().lexically_relative(system);
-    const bool leads_out = entry->is_symlink() && files::read_symlink(*entry).is_absolute();
-    if (leads_out || files::exists(file)) continue;
+    const bool is_there = files::exists(file) && !leads_out(file) &&
+                          files::is_directory(file) == entry->is_directory();
+    if (is_there || leads_out(*entry)) continue;
     is_good = complain(file.string() + " is missing");
     entry.disable_recursion_pending();
   }
   for (const std::string name : {"zoneinfo64", "metaZones", "timezoneTypes", "windowsZones"}) {
     const files::path bundle = directory / "icutz" / (name + ".res");
-    if (!is_whole_bundle(content_of(bundle)))
-      is_good = complain(bundle.string() + " is missing or not whole");
+    is_good &= (!leads_out(bundle) && is_whole_bundle(content_of(bundle))) ||
+               complain(bundle.string() + " is missing or not whole");
   }
-  const std::string zone = local_zone();
-  if (zone.empty() || is_whole_zone(content_of(zoneinfo / zone))) return is_good;
-  return complain((zoneinfo / zone).string() + ", the local zone, is missing or not whole");
+  const files::path zone = zoneinfo / local_zone();
+  if (zone == zoneinfo / "" || is_whole_zone(content_of(zone))) return is_good;
+  return complain(zone.string() + ", the local zone, is missing or not whole");
 }
