@@ -1,7 +1,7 @@
 # What an image gets: the tools, their manuals, the unit, the documents.
 include(GNUInstallDirs)
 set(KESTREL_UNIT_DIR lib/systemd/system CACHE STRING
-  "Where the systemd unit goes, relative to the prefix unless absolute")
+  "The directory of the systemd unit, relative to the prefix unless absolute")
 
 configure_file(man/kestrel.8.in man/kestrel.8 @ONLY)
 configure_file(man/kestrelctl.8.in man/kestrelctl.8 @ONLY)

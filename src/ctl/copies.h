@@ -25,7 +25,7 @@ struct copy {
 [[nodiscard]] copy examine(const std::string& path);
 
 /// The copy that the zoneinfo link names. Where it names none, path and text are "none", and the
-/// version is that of the system copy, by which a run goes on.
+/// version is that of the system copy, with which a run continues.
 [[nodiscard]] copy active_copy();
 
 /// Whether both the zoneinfo and the ICU link are those of the copy at `path`.

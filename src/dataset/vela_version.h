@@ -13,7 +13,7 @@ struct vela_version {
   std::int32_t major = -1;  // -1 when absent, so older than a present 0
   std::int32_t minor = -1;
 
-  /// Overwrites the record with the version that `text` stands for.
+  /// Overwrites the record with the version that `text` names.
   /// A text of another form prints "Cannot parse version string %s, results.size() = 0" and
   /// "Cannot parse version string %s", and leaves the unknown version.
   /// Throws std::out_of_range (errno ERANGE) when a number is above 2147483647; the fields

@@ -13,7 +13,7 @@
 /// Throws what `fs::read_symlink` and `dataset_path_from_link` throw; a missing link is a bad one.
 [[nodiscard]] std::string current_dataset_path();
 
-/// The dataset path that the zoneinfo link's content `target` stands for: what comes before its
+/// The dataset path that the zoneinfo link's content `target` names: what comes before its
 /// last "/" for a tree in a download, empty for exactly the system copy's tree.
 /// Anything else prints "Bad zoneinfo link %s" and throws the `int` -1; errno is then ENOENT for
 /// an empty target, that of a missing link, and otherwise 0.
