@@ -12,9 +12,9 @@ class workplace final {
   static constexpr const char* path = "/var/db/timezone/tz/.kestrelctl";
 
   /// Takes the lock, and removes and prints what a killed command left. As root, the program
-  /// continues as the owner of the storage: then nothing that this owner has put there leads to a file of
-  /// root's, and the owner can remove what is made. Throws std::runtime_error where another command
-  /// has the lock, and std::system_error where the directory cannot be made or used.
+  /// continues as the owner of the storage: then nothing that this owner has put there leads to a
+  /// file of root's, and the owner can remove what is made. Throws std::runtime_error where another
+  /// command has the lock, and std::system_error where the directory cannot be made or used.
   workplace();
 
   /// Removes the directory with all that is in it, and a tz_latest that was staged.

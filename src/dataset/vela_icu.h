@@ -20,7 +20,7 @@ class vela_icu final : public vela_dataset_component {
   /// For a download, replaces "/var/db/timezone/icutz" by a link to this directory, in one step or
   /// by a removal and a creation; for the system copy, removes it. Then removes the legacy
   /// "/var/db/icutz", unless the other removal failed; prints "unlink of ICU softlink failed" after
-  /// either. Throws `int` when the link cannot be created. "icutz.new" is gone then, without room not.
+  /// either. Throws `int` when the link cannot be created. "icutz.new" stays only without room.
   void activate() const override;
 
  private:
