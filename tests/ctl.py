@@ -98,6 +98,7 @@ def test_interrupted(fault):
     before, seen = kinds(), Counter()
     ctl("publish 2026b.1.0 DIR", *TRACER)
     undisturbed = kinds()
+    assert "unlink(\"/var/db/timezone/tz_latest\"" not in Path("/tmp/trace").read_text()
     for line in Path("/tmp/trace").read_text().splitlines():
         name = line.split("(")[0]
         seen[name] += 1
