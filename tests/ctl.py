@@ -1,5 +1,6 @@
 # Tests kestrelctl on real zones, and on bundles that are whole by their index.
 
+import fcntl
 import os
 import re
 import shutil
@@ -45,6 +46,8 @@ def ctl(line, *tracer):
 
 
 def test_publish_and_back():
+    alone = ctl("publish 2026b.1.0 DIR", "bash", "-c", 'exec -a /nowhere/kestrelctl "$@"', "bash")
+    assert (alone.returncode, alone.stderr.count("2026b.1.0 is not active")) == (1, 1)
     for _ in range(2):
         done = ctl("publish 2026b.1.0 DIR")
         assert (done.returncode, done.stdout) == (0, "2026b.1.0 is active\n"), done.stderr
@@ -74,7 +77,6 @@ def test_publish_and_back():
     ("2026c", "mv icutz/icutz44l.dat icutz/icutz44b.dat", "no schema by icutz/icutz44l.dat"),
     ("2026c", "rm icutz/metaZones.res", "icutz/metaZones.res is missing or not whole"),
     ("2026c", "truncate -s 100 zoneinfo/Asia/Tokyo", "the local zone, is missing or not whole"),
-    ("2026c", "rm zoneinfo/+VERSION", "zoneinfo/+VERSION is missing"),
     ("2026c", ": >zoneinfo/+VERSION", "zoneinfo/+VERSION is not whole"),
     ("2026c", "echo x >zoneinfo/Etc/UTC", "zoneinfo/Etc/UTC is not whole"),
     ("2026c", "mv zoneinfo/Etc .; ln -s ../Etc zoneinfo", "zoneinfo/Etc is missing"),
@@ -107,24 +109,23 @@ def test_interrupted(fault):
             end = ctl("publish 2026b.1.0 DIR", *TRACER, "-e", f"inject={name}:{fault}:when={seen[name]}")
             published = (STORAGE / "tz_latest/zoneinfo/Etc/UTC").exists()
             assert end.returncode == -9 or published or kinds() == before, line
-            assert published or not (STORAGE / "tz_latest").is_symlink(), line
+            assert published or not os.path.lexists(STORAGE / "tz_latest"), line
             assert (STORAGE / "localtime").exists(), line
             assert ctl("publish 2026b.1.0 DIR").returncode == 0 and kinds() == undisturbed, line
 
 
 def test_two_at_once():
-    first = subprocess.Popen([*TRACER, "-e", "inject=syncfs:delay_enter=500000:when=1",
-                              KESTREL + "ctl", "publish", "2026b.1.0", FETCHED])
-    while first.poll() is None and not (STORAGE / "tz/.kestrelctl/download/icutz").exists():
-        pass
+    (STORAGE / "tz/.kestrelctl").mkdir()
+    lock = os.open(STORAGE / "tz/.kestrelctl", os.O_RDONLY)
+    fcntl.flock(lock, fcntl.LOCK_EX)
     for line in ("publish 2026b.1.0 DIR", "back", "prune"):
         assert "another kestrelctl is at work" in ctl(line).stderr
-    assert (first.wait(), ctl("status").stdout.splitlines()[0]) == (0, "active: 2026b.1.0")
+    os.close(lock)
+    assert ctl("publish 2026b.1.0 DIR").stdout == "2026b.1.0 is active\n"
 
 
 def test_storage_of_another_user():
-    subprocess.run("chown -hR 1234 .; chmod 755 . tz; chmod 644 /tmp/fetched/icutz/*", shell=True, cwd=STORAGE,
-                   check=True)
+    os.system("cd /var/db/timezone; chown -hR 1234 .; chmod 755 . tz; chmod a+r /tmp/fetched/icutz/*")
     assert ctl("publish 2026b.1.0 DIR").returncode == 0
     assert {os.stat(path).st_uid for path in (STORAGE / "tz").rglob("*")} == {1234}
     for line, said in (("publish 2026c.1.0 DIR", "2026c.1.0 waits for the next run of kestrel"),

@@ -112,10 +112,11 @@ TEST(Whole, Zones) {
   EXPECT_FALSE(is_whole_zone(zone + "\n"));
   for (std::size_t size = 0; size < zone.size(); ++size)
     EXPECT_FALSE(is_whole_zone(zone.substr(0, size))) << size;
+  EXPECT_FALSE(is_whole_zone("x" + zone.substr(1)));
   EXPECT_FALSE(is_whole_zone(zone.replace(zone.rfind('\n', zone.size() - 2), 1, "x")));
-  std::string first_version = "TZif" + std::string(19, '\0') + '\1' + std::string(12, '\0');
-  first_version += std::string("\0\0\0\1\0\0\0\4", 8) + std::string(6 + 4 + 1, '\0');
-  EXPECT_TRUE(is_whole_zone(first_version));
+  const std::string header = "TZif" + std::string(19, '\0') + '\1' + std::string(12, '\0');
+  EXPECT_TRUE(is_whole_zone(header + std::string("\0\0\0\1\0\0\0\4type   UTC 1", 19)));
+  EXPECT_FALSE(is_whole_zone(header + std::string(8 + 1, '\0')));
 }
 
 TEST(Whole, Bundles) {
