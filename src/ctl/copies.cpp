@@ -29,7 +29,7 @@ copy examine(const std::string& path) {
   } else if (!files::is_directory(zoneinfo_directory(path), error)) {
     found.fault = zoneinfo_directory(path) + " is missing";
   } else if (!found.fits || fs::read_first_word(schema_file).empty()) {
-    found.fault = icu_directory(path) + " has not the schema in " + schema_file;
+    found.fault = icu_directory(path) + " has another schema than " + schema_file;
   }
   return found;
 }

@@ -24,7 +24,7 @@ bool is_public(files::path path) {
 
 bool leads_to(const char* path, const char* link) {
   std::error_code error;
-  return files::equivalent(path, link, error) ||
+  return target_of(path) == link || files::equivalent(path, link, error) ||
          complain(std::string(path) + " does not lead to " + link + ": make it a link to that");
 }
 
@@ -55,7 +55,7 @@ struct decision {
     is_good &= next.starts_with("keeps") || complain("the next run of kestrel " + next);
     is_good &= newest.fault.empty() || complain("the newest download: " + newest.fault);
     is_good &= !is_usable || is_active(active.path) ||
-               complain("icutz is of another copy: mend it by kestrelctl back" +
+               complain("icutz is of another copy: correct it by kestrelctl back" +
                         (active.path.empty() ? "" : " " + active.version_text));
     is_good &= system.fault.empty() || complain("the image has to be repaired: " + system.fault);
     is_good &= (!local_zone().empty() && is_whole_zone(content_of(paths::localtime_link))) ||

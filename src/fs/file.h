@@ -9,9 +9,9 @@ namespace fs {
 
 /// The first word of the file at `path`, links followed: the bytes (NULs included) between leading
 /// white space of the C locale and the next white space or the end of the file. Empty when the file
-/// is missing, not regular, cannot be read to the word's end, holds only white space, or when the
-/// word does not end within 64 MiB or the available memory: a sparse file must not cost a boot.
-/// Prints and throws nothing.
+/// is missing, not regular, blank, or cannot be read. Also empty when the word does not end within
+/// the file's first 64 MiB or the available memory: a sparse file must not cost a boot. Prints and
+/// throws nothing.
 [[nodiscard]] std::string read_first_word(const char* path) noexcept;
 
 /// Makes the file at `path` hold exactly `content`; a new file gets mode 0666 less the umask. A
