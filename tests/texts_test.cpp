@@ -114,9 +114,9 @@ TEST(Whole, Zones) {
     EXPECT_FALSE(is_whole_zone(zone.substr(0, size))) << size;
   EXPECT_FALSE(is_whole_zone("x" + zone.substr(1)));
   EXPECT_FALSE(is_whole_zone(zone.replace(zone.rfind('\n', zone.size() - 2), 1, "x")));
-  const std::string header = "TZif" + std::string(19, '\0') + '\1' + std::string(12, '\0');
-  EXPECT_TRUE(is_whole_zone(header + std::string("\0\0\0\1\0\0\0\4type   UTC 1", 19)));
-  EXPECT_FALSE(is_whole_zone(header + std::string(8 + 1, '\0')));
+  const std::string head = "TZif" + std::string(19, '\0') + '\1' + std::string(7, '\0') + '\1';
+  EXPECT_TRUE(is_whole_zone(head + std::string("\0\0\0\0\0\0\0\1\0\0\0\4type  UTC leap    1", 31)));
+  EXPECT_FALSE(is_whole_zone(head + std::string(4 + 8 + 8 + 1, '\0')));
 }
 
 TEST(Whole, Bundles) {

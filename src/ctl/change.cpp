@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <functional>
 #include <iostream>
 #include <map>
 #include <set>
@@ -31,12 +32,13 @@ bool is_new(const copy& wanted) {
   return complain(wanted.version_text + " is not newer than the copy " + rival.version_text);
 }
 
-/// All that is in a tree, with the targets of links and the contents of files.
+/// All that is in a tree, with the targets of links and a hash of the contents of files.
 std::map<files::path, std::string> entries_of(const files::path& tree) {
   std::map<files::path, std::string> all;
   for (const auto& entry : files::recursive_directory_iterator(tree)) {
     std::string& what = all[entry.path().lexically_relative(tree)];
-    what = entry.is_symlink() ? files::read_symlink(entry).string() : content_of(entry);
+    what = std::to_string(std::hash<std::string>()(content_of(entry)));
+    if (entry.is_symlink()) what = files::read_symlink(entry);
   }
   return all;
 }
@@ -85,7 +87,6 @@ bool publish(const std::string& version_text, const files::path& directory) {
   if (is_there && (entries_of(path + "/zoneinfo") != entries_of(directory / "zoneinfo") ||
                    entries_of(path + "/icutz") != entries_of(directory / "icutz")))
     return complain(path + " has other content: publish this under a higher version");
-  if (is_active(path) && target_of(paths::latest_link) == path) return confirm_active(path);
 
   if (!is_complete(directory) || (!is_there && !add_download(place, directory, path))) return false;
   try {
@@ -105,8 +106,10 @@ bool go_back(const std::string& version_text) {
   const workplace place;
   const std::string path = version_text.empty() ? "" : paths::downloads + version_text;
   const copy wanted = examine(path);
-  if (!path.empty() ? !wanted.fault.empty() : !files::exists(paths::system_zoneinfo))
-    return complain(wanted.fault);
+  const files::path zone = paths::system_zoneinfo / files::path(local_zone());
+  if (wanted.ends_run || (!path.empty() && !wanted.fault.empty())) return complain(wanted.fault);
+  if (path.empty() && zone.has_filename() && !is_whole_zone(content_of(zone)))
+    return complain(zone.string() + ", the local zone, is missing or not whole");
   if (examine("").version > wanted.version)
     return complain(version_text + " is older than the system copy: a run would leave it");
   if (!path.empty() && !is_complete(path)) return false;
@@ -119,9 +122,12 @@ bool go_back(const std::string& version_text) {
 bool prune() {
   const workplace place;
   std::set<files::path> linked = {files::path(workplace::path).filename()};
-  for (const auto& entry : files::directory_iterator(paths::storage))
-    linked.insert(*files::relative(entry, paths::downloads).begin());
+  for (const auto& entry : files::directory_iterator(paths::storage)) {
+    const files::path target = paths::storage / files::path(target_of(entry.path().c_str()));
+    linked.insert(*target.lexically_normal().lexically_relative(paths::downloads).begin());
+    linked.insert(*files::relative(target, paths::downloads).begin());
+  }
   for (const auto& entry : files::directory_iterator(paths::downloads))
-    if (!entry.is_symlink() && !linked.contains(entry.path().filename())) remove_and_say(entry);
+    if (!linked.contains(entry.path().filename())) remove_and_say(entry);
   return true;
 }

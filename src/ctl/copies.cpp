@@ -1,5 +1,6 @@
 #include "ctl/copies.h"
 
+#include <cstdint>
 #include <stdexcept>
 #include <string_view>
 #include <system_error>
@@ -18,13 +19,13 @@ copy examine(const std::string& path) {
   try {
     if (!found.ends_run) found.version.parse(found.version_text);
   } catch (const std::out_of_range&) {
-    found.version = {};
+    found.version = {path.empty() ? INT32_MAX : -1, {}, -1, -1};
     found.ends_run = true;
   }
   std::error_code error;
   found.fits =
       path.empty() || (files::exists(path, error) && vela_icu(path).compatible_schema(vela_icu()));
-  if (found.version == vela_version()) {
+  if (found.ends_run || found.version == vela_version()) {
     found.fault = found.version_text + " is no version, or has a number above 2147483647";
   } else if (!files::is_directory(zoneinfo_directory(path), error)) {
     found.fault = zoneinfo_directory(path) + " is missing";
@@ -38,9 +39,9 @@ copy active_copy() {
   const std::string target = target_of(paths::zoneinfo_link);
   const std::string path = target.substr(0, target.rfind('/'));
   if (target == paths::system_zoneinfo) return examine("");
-  const bool is_download = path.starts_with(paths::downloads);
-  copy found = is_download ? examine(path) : copy{"none", "none", examine("").version};
-  if (target != path + "/zoneinfo" || !is_download)
+  copy found{"none", "none", examine("").version};
+  if (path.starts_with(paths::downloads)) found = examine(path);
+  if (target != found.path + "/zoneinfo")
     found.fault = std::string(paths::zoneinfo_link) + " leads to no copy";
   return found;
 }
@@ -57,7 +58,6 @@ std::string target_of(const char* link) {
 
 std::string local_zone() {
   const std::string target = target_of(paths::localtime_link);
-  for (const std::string top : {paths::zoneinfo_link, paths::legacy_zoneinfo})
-    if (target.starts_with(top + "/")) return target.substr(top.size() + 1);
-  return {};
+  const std::string top = paths::zoneinfo_link;
+  return target.starts_with(top + "/") ? files::path(target).lexically_relative(top) : "";
 }

@@ -20,8 +20,7 @@ int run(const line& words) {
   if (words == line{"status"}) return status() ? 0 : 1;
   if (words.size() == 3 && words[0] == "publish") return publish(words[1], words[2]) ? 0 : 1;
   if (words == line{"back"}) return go_back("") ? 0 : 1;
-  if (words.size() == 2 && words[0] == "back" && !words[1].empty())
-    return go_back(words[1]) ? 0 : 1;
+  if (words.size() == 2 && words[0] == "back" && words[1] > "") return go_back(words[1]) ? 0 : 1;
   if (words == line{"prune"}) return prune() ? 0 : 1;
   if (words == line{"--version"}) return std::cout << "kestrelctl " KESTREL_VERSION "\n" ? 0 : 1;
   if (words == line{"--help"}) return std::cout << usage << '\n' ? 0 : 1;

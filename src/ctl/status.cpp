@@ -23,8 +23,8 @@ bool is_public(files::path path) {
 }
 
 bool leads_to(const char* path, const char* link) {
-  std::error_code error;
-  return target_of(path) == link || files::equivalent(path, link, error) ||
+  const files::path target = files::path(path).parent_path() / target_of(path);
+  return target.lexically_normal() == link ||
          complain(std::string(path) + " does not lead to " + link + ": make it a link to that");
 }
 
@@ -42,7 +42,6 @@ struct decision {
     if (!is_active("") && (ends || !active.fits || system.version > active.version))
       next = "goes back to the system copy";
     if (!ends && newest.fits && newest.version > active.version) next = "switches to " + latest;
-    if (system.ends_run) next = "can change nothing";
   }
 
   /// Complains of each fault.

@@ -1,6 +1,7 @@
 #include "ctl/storage.h"
 
 #include <fcntl.h>
+#include <grp.h>
 #include <sys/file.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -21,6 +22,7 @@ void check(bool done, const char* path) {
 
 int open_workplace() {
   struct stat owned {};
+  static_cast<void>(::setgroups(0, nullptr));  // only root can, and only root has to
   for (const char* const place : {paths::storage, paths::downloads}) {
     check(::stat(place, &owned) == 0, place);
     if (::geteuid() == 0)
@@ -40,13 +42,11 @@ workplace::workplace() : directory(open_workplace()) {
       locked.st_nlink == 0)
     throw std::runtime_error("another kestrelctl is at work: start again when it has ended");
   for (const auto& entry : files::directory_iterator(path)) remove_and_say(entry);
-  remove_and_say(new_latest_link);
 }
 
 workplace::~workplace() {
   std::error_code ignored;
   files::remove_all(path, ignored);
-  files::remove(new_latest_link, ignored);
 }
 
 void workplace::sync() const {

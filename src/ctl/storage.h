@@ -17,7 +17,7 @@ class workplace final {
   /// command has the lock, and std::system_error where the directory cannot be made or used.
   workplace();
 
-  /// Removes the directory with all that is in it, and a tz_latest that was staged.
+  /// Removes the directory with all that is in it.
   ~workplace();
 
   /// Writes all that its file system holds to the disk. Throws std::system_error on failure.
@@ -31,7 +31,7 @@ class workplace final {
 };
 
 /// The name under which a new tz_latest is staged.
-inline constexpr const char* new_latest_link = "/var/db/timezone/tz_latest.new";
+inline constexpr const char* new_latest_link = "/var/db/timezone/tz/.kestrelctl/tz_latest";
 
 /// Removes what is at `path`, with all that is in it, and prints its path on standard output; does
 /// nothing where there is nothing. Throws std::system_error on failure.

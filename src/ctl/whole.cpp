@@ -47,14 +47,14 @@ bool is_whole_zone(std::string_view zone) {
 }
 
 bool is_whole_bundle(std::string_view bundle) {
-  constexpr std::size_t index = 16;  // where the body has its length in words of 32 bits
   if (bundle.size() < 16 || bundle.substr(2, 2) != "\xda\x27" || bundle.substr(12, 4) != "ResB")
     return false;
   const bool big = bundle[8] != 0;
   const auto header = static_cast<std::size_t>(number_at(bundle, 0, 2, big));
-  if (bundle.size() < header + index + 4) return false;
-  const std::uint64_t length = 4 * number_at(bundle, header + index, 4, big);
-  return length > index && bundle.size() >= header + length;
+  if (bundle.size() < header + 16 + 4) return false;
+  // The fifth word of the body is its length in words of 32 bits.
+  const std::uint64_t length = 4 * number_at(bundle, header + 16, 4, big);
+  return length > 16 && bundle.size() >= header + length;
 }
 
 std::string content_of(const files::path& path) {
