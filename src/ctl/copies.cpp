@@ -19,6 +19,7 @@ copy examine(const std::string& path) {
   try {
     if (!found.ends_run) found.version.parse(found.version_text);
   } catch (const std::out_of_range&) {
+    // Nothing is newer than a system copy that ends every run.
     found.version = {path.empty() ? INT32_MAX : -1, {}, -1, -1};
     found.ends_run = true;
   }
