@@ -76,26 +76,26 @@ bool is_complete(const files::path& directory) {
   const files::path zoneinfo = directory / "zoneinfo";
   for (const auto& entry : files::recursive_directory_iterator(zoneinfo)) {
     if (entry.is_directory() || entry.is_symlink()) continue;
-    const std::string expected = content_of(system / entry.path().lexically_relative(zoneinfo));
     const std::string content = content_of(entry);
-    const bool is_zone = content.starts_with("TZif") || expected.starts_with("TZif");
+    const files::path twin = system / entry.path().lexically_relative(zoneinfo);
+    const bool is_zone = content.starts_with("TZif") || content_of(twin).starts_with("TZif");
     is_good &= (is_zone ? is_whole_zone(content) : !content.empty()) ||
-               complain(entry.path().string() + " is not whole");
+               complain(entry.path().lexically_relative(directory).string() + " is not whole");
   }
   for (files::recursive_directory_iterator entry(system), end; entry != end; ++entry) {
     const files::path file = zoneinfo / entry->path().lexically_relative(system);
     const bool is_there = files::exists(file) && !leads_out(file) &&
                           files::is_directory(file) == entry->is_directory();
     if (is_there || leads_out(*entry)) continue;
-    is_good = complain(file.string() + " is missing");
+    is_good = complain(file.lexically_relative(directory).string() + " is missing");
     entry.disable_recursion_pending();
   }
   for (const std::string name : {"zoneinfo64", "metaZones", "timezoneTypes", "windowsZones"}) {
     const files::path bundle = directory / "icutz" / (name + ".res");
     is_good &= (!leads_out(bundle) && is_whole_bundle(content_of(bundle))) ||
-               complain(bundle.string() + " is missing or not whole");
+               complain("icutz/" + name + ".res is missing or not whole");
   }
-  const files::path zone = zoneinfo / local_zone();
-  if (zone == zoneinfo / "" || is_whole_zone(content_of(zone))) return is_good;
-  return complain(zone.string() + ", the local zone, is missing or not whole");
+  const std::string zone = local_zone();
+  if (zone.empty() || is_whole_zone(content_of(zoneinfo / zone))) return is_good;
+  return complain("zoneinfo/" + zone + ", the local zone, is missing or not whole");
 }

@@ -19,6 +19,6 @@
 bool complain(const std::string& fault);
 
 /// Whether the download in `directory` has ICU's four bundles, the local zone and the files that
-/// the system copy has, all whole. Complains of each that is not. Throws std::system_error where a
-/// directory cannot be read.
+/// the system copy has, all whole. Complains of each that is not, by its path in the download.
+/// Throws std::system_error where a directory cannot be read.
 [[nodiscard]] bool is_complete(const files::path& directory);
