@@ -88,7 +88,7 @@ bool publish(const std::string& version_text, const files::path& directory) {
                    entries_of(path + "/icutz") != entries_of(directory / "icutz")))
     return complain(path + " has other content: publish this under a higher version");
 
-  if (!is_there && !add_download(place, directory, path)) return false;
+  if (is_there ? !is_complete(path) : !add_download(place, directory, path)) return false;
   try {
     name_newest(path);
   } catch (int) {

@@ -34,7 +34,8 @@ struct copy {
 /// The target of a link; empty where there is no link or it cannot be read.
 [[nodiscard]] std::string target_of(const char* link);
 
-/// The name of the local zone, such as Europe/Paris; empty where a run would set another.
+/// The name of the local zone, such as Europe/Paris; empty where it is not reached through the
+/// zoneinfo link.
 [[nodiscard]] std::string local_zone();
 
 /// The file whose first word is the system copy's schema, such as 44l.
