@@ -7,8 +7,7 @@ namespace paths {
 inline constexpr const char* system_zoneinfo = "/usr/share/zoneinfo.default";
 inline constexpr const char* system_icu = "/usr/share/icu";
 
-// The storage. The two directories carry a trailing slash; the path of a download is `downloads`
-// followed by its version text.
+// The storage. The path of a download is `downloads` followed by its version text.
 inline constexpr const char* storage = "/var/db/timezone/";
 inline constexpr const char* downloads = "/var/db/timezone/tz/";
 

@@ -1,7 +1,5 @@
 #include "dataset/vela_dataset.h"
 
-#include <unistd.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <stdexcept>
@@ -53,10 +51,8 @@ void vela_dataset::activate() const {
   try {
     for (const auto& component : components) component->activate();
   } catch (...) {
-    const int error = errno;
     // Without room, the staged link may be the only sign of what is not finished.
-    if (error != ENOSPC && error != EDQUOT) ::unlink(paths::new_icu_link);
-    errno = error;
+    if (errno != ENOSPC && errno != EDQUOT) fs::unstage_symlink(paths::new_icu_link);
     throw;
   }
 }

@@ -11,11 +11,10 @@
 /// its version under "/var/db/timezone/tz/". Built whole by its constructor and never changed.
 class vela_dataset {
  public:
-  /// The download in the directory `dataset_path`, or the system copy for the empty path. A version
-  /// text that does not parse gives the unknown version (and `vela_version::parse`'s messages).
-  /// A path that does not begin with "/var/db/timezone/tz/" and at least one byte more prints
+  /// The download in the directory `dataset_path`, or the system copy for the empty path. A path
+  /// that does not begin with "/var/db/timezone/tz/" and at least one byte more prints
   /// "vela_dataset::create_components: bad path %s" and throws std::invalid_argument (errno 0).
-  /// Throws also what parsing the version and constructing the components throw.
+  /// Prints and throws also what parsing the version and constructing the components do.
   explicit vela_dataset(std::string dataset_path = {});
 
   /// Whether both have the same path.
@@ -32,9 +31,8 @@ class vela_dataset {
   /// ICU data is at "/var/db/timezone/icutz.new" meanwhile. What a component throws ends it.
   void activate() const;
 
-  /// Completes an activation of this dataset that was killed after the zoneinfo link: activates the
-  /// ICU component, if "/var/db/timezone/icutz.new" is a link to this copy's ICU data. To be called
-  /// only on the dataset that the zoneinfo link names. Throws what that activation throws.
+  /// Completes a killed activation of this dataset, which the zoneinfo link names: activates the
+  /// ICU component if "/var/db/timezone/icutz.new" is a link to its data. Throws what that throws.
   void finish() const;
 
   /// The text that the version was parsed from: what follows "/var/db/timezone/tz/" in a download's

@@ -3,10 +3,9 @@
 #include <string>
 #include <utility>
 
-/// One kind of time-zone data of one dataset, and the link through which the system reads it.
-/// It reads its files when it is constructed and never changes. It is held by a shared pointer made
-/// from a pointer to its concrete class; the protected destructor keeps anyone from deleting it
-/// through this one.
+/// One kind of time-zone data of one dataset, and the link through which the system reads it. It
+/// reads its files when it is constructed and never changes. A shared pointer made from a pointer
+/// to its concrete class holds it: the protected destructor forbids deleting it through this one.
 class vela_dataset_component {
  public:
   /// Whether `other` can serve in this component's place.

@@ -3,7 +3,6 @@
 #include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
@@ -93,7 +92,7 @@ void vela_icu::activate() const {
     fs::report(errno, "unlink of ICU softlink failed");
   }
   if (!is_download) {
-    ::unlink(paths::new_icu_link);
+    fs::unstage_symlink(paths::new_icu_link);
   } else if (!replaced) {
     fs::create_symlink(data, paths::icu_link);
   }

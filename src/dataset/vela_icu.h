@@ -9,8 +9,7 @@
 /// active when that link is absent.
 class vela_icu final : public vela_dataset_component {
  public:
-  /// The ICU data of the dataset in the directory `path`, or the system copy's for the empty path.
-  /// Throws what `initialize` throws.
+  /// The data of the dataset at `path`, the system copy's for "". Throws what `initialize` throws.
   explicit vela_icu(const std::string& path = {});
 
   /// Whether `other` is ICU data of the same schema. Anything but ICU data prints
@@ -19,8 +18,8 @@ class vela_icu final : public vela_dataset_component {
 
   /// For a download, replaces "/var/db/timezone/icutz" by a link to this directory, in one step or
   /// by a removal and a creation; for the system copy, removes it. Then removes the legacy
-  /// "/var/db/icutz", unless the other removal failed; prints "unlink of ICU softlink failed" after
-  /// either. Throws `int` when the link cannot be created. "icutz.new" stays only without room.
+  /// "/var/db/icutz", unless a removal failed: prints "unlink of ICU softlink failed" after either.
+  /// Throws `int` when the link cannot be created. "icutz.new" stays only without room.
   void activate() const override;
 
  private:

@@ -17,11 +17,9 @@ std::string_view take_run(std::string_view& rest, std::string_view allowed = "01
   return run;
 }
 
-/// Cuts a dot and digits off the front of `rest` and gives the digits; nothing if either is
-/// missing.
+/// Cuts a dot and digits off the front of `rest` and gives the digits; neither if one is missing.
 std::string_view take_dotted_number(std::string_view& rest) {
-  if (!rest.starts_with('.')) return {};
-  std::string_view behind_dot = rest.substr(1);
+  std::string_view behind_dot = rest.substr(rest.starts_with('.') ? 1 : rest.size());
   const std::string_view number = take_run(behind_dot);
   if (!number.empty()) rest = behind_dot;
   return number;

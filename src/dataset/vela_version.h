@@ -13,11 +13,10 @@ struct vela_version {
   std::int32_t major = -1;  // -1 when absent, so older than a present 0
   std::int32_t minor = -1;
 
-  /// Overwrites the record with the version that `text` names.
-  /// A text of another form prints "Cannot parse version string %s, results.size() = 0" and
-  /// "Cannot parse version string %s", and leaves the unknown version.
-  /// Throws std::out_of_range (errno ERANGE) when a number is above 2147483647; the fields
-  /// before it keep their new values.
+  /// Overwrites the record with the version that `text` names. A text of another form prints
+  /// "Cannot parse version string %s, results.size() = 0" and "Cannot parse version string %s", and
+  /// leaves the unknown version. Throws std::out_of_range (errno ERANGE) when a number is above
+  /// 2147483647; the fields before it keep their new values.
   void parse(const std::string& text);
 
   /// Older and newer, field by field in the order above: numbers by value, letters by bytes.

@@ -19,10 +19,9 @@ class vela_zoneinfo final : public vela_dataset_component {
     return true;
   }
 
-  /// Replaces "/var/db/timezone/zoneinfo" by a link to this tree, whether or not the tree exists:
-  /// in one step, or by a removal and a creation. After a removal that fails, prints "Unlink of
-  /// zoneinfo softlink failed" and tries the creation. Throws `int` when the link cannot be
-  /// created.
+  /// Replaces "/var/db/timezone/zoneinfo" by a link to this tree, which need not exist, in one step
+  /// or by a removal and a creation; prints "Unlink of zoneinfo softlink failed" after a removal
+  /// that fails, and continues. Throws `int` when the link cannot be created.
   void activate() const override;
 
  private:

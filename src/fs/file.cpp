@@ -15,18 +15,7 @@ namespace fs {
 namespace {
 
 // With fewer bits, calls fail on large inode numbers and on dates after 2038.
-static_assert(sizeof(off_t) == 8);
-static_assert(sizeof(ino_t) == 8);
-static_assert(sizeof(time_t) == 8);
-
-/// Opens `path` unless it is something other than a regular file: opening alone can set a device to
-/// work. O_NONBLOCK is for an entry that changes between the two calls.
-descriptor open_regular(const char* path, int flags) noexcept {
-  constexpr mode_t new_file_mode = 0666;
-  struct stat found {};
-  if (::stat(path, &found) == 0 && !S_ISREG(found.st_mode)) return descriptor(-1);
-  return descriptor(::open(path, flags | O_CLOEXEC | O_NONBLOCK, new_file_mode));
-}
+static_assert(sizeof(off_t) == 8 && sizeof(ino_t) == 8 && sizeof(time_t) == 8);
 
 /// The first word read from an open descriptor; may throw std::bad_alloc.
 std::string first_word(int file) {
@@ -51,7 +40,10 @@ std::string first_word(int file) {
 }  // namespace
 
 std::string read_first_word(const char* path) noexcept {
-  const descriptor file = open_regular(path, O_RDONLY);
+  struct stat found {};
+  // Opening alone can set a device to work. O_NONBLOCK is for an entry that changes in between.
+  if (::stat(path, &found) == 0 && !S_ISREG(found.st_mode)) return {};
+  const descriptor file(::open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK));
   if (!file.is_open()) return {};
   try {
     return first_word(file.get());
@@ -61,10 +53,12 @@ std::string read_first_word(const char* path) noexcept {
 }
 
 void write_file(const char* path, std::string_view content) noexcept {
-  const descriptor file = open_regular(path, O_WRONLY | O_CREAT | O_NOFOLLOW);
-  struct stat opened {};
-  if (!file.is_open() || ::fstat(file.get(), &opened) != 0 || opened.st_nlink > 1) return;
-  if (::ftruncate(file.get(), 0) != 0) return;
+  struct stat old {};
+  const bool keeps_mode = ::lstat(path, &old) == 0 && S_ISREG(old.st_mode);
+  ::unlink(path);
+  const descriptor file(::open(path, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666));
+  if (!file.is_open()) return;
+  if (keeps_mode) ::fchmod(file.get(), old.st_mode & 0777);
   [[maybe_unused]] const ssize_t ignored = ::write(file.get(), content.data(), content.size());
 }
 

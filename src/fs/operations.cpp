@@ -69,8 +69,15 @@ bool is_symlink_to(const char* target, const char* link) noexcept {
 bool stage_symlink(const char* target, const char* staged) noexcept {
   if (::symlink(target, staged) == 0 || is_symlink_to(target, staged)) return true;
   if (errno != EEXIST) return false;
-  ::unlink(staged);
+  unstage_symlink(staged);
   return ::symlink(target, staged) == 0 || is_symlink_to(target, staged);
+}
+
+void unstage_symlink(const char* staged) noexcept {
+  const int error = errno;
+  char ignored = '\0';
+  if (::readlink(staged, &ignored, 1) >= 0) ::unlink(staged);
+  errno = error;
 }
 
 void require_room(const char* target, const char* link) {
@@ -84,7 +91,7 @@ bool replace_symlink(const char* target, const char* link, const char* staged) {
     if (errno == ENOENT && is_symlink_to(target, link)) return true;  // another run renamed it
   }
   require_room(target, link);
-  ::unlink(staged);
+  unstage_symlink(staged);
   return false;
 }
 

@@ -32,22 +32,24 @@ void create_symlink(const char* target, const char* link);
 [[nodiscard]] bool is_symlink_to(const char* target, const char* link) noexcept;
 
 /// Makes sure that a link with the content `target` is at `staged`, the name beside a link that is
-/// to be replaced. One with that content may be there already, from another run; any other file or
-/// link is removed first.
-/// False where the link cannot be made, with the number in errno. Prints and throws nothing.
+/// to be replaced. One with that content may be there already, from another run; any other link is
+/// removed first.
+/// False where the link cannot be made, for example because something that is no link is there,
+/// with the number in errno. Prints and throws nothing.
 [[nodiscard]] bool stage_symlink(const char* target, const char* staged) noexcept;
 
+/// Removes the link at `staged`; what is no link stays. Silent; leaves errno as it was.
+void unstage_symlink(const char* staged) noexcept;
+
 /// To be called when a link could not be staged or renamed. If errno says that the storage is full,
-/// prints "create_symlink: from %s to %s" and throws `int`: a link that is removed may make no
-/// room. Not on tmpfs and ext4 without a free inode, where it does. XFS refuses a link then all the
-/// same.
+/// prints "create_symlink: from %s to %s" and throws `int`: to remove a link may make no room. Does
+/// nothing on tmpfs and ext4 without a free inode, where it does; XFS may still refuse a link.
 void require_room(const char* target, const char* link);
 
 /// Replaces the link or file at `link`, if any, by a link with the content `target`, in one step:
-/// every reader finds the old entry or the new link. The new link is staged at `staged` and renamed
-/// to `link`; where another run renames it first, that is as good.
+/// it is staged at `staged` and renamed, so every reader finds the old entry or the new link.
 /// False where this cannot be done (a directory is at `link`, for example): `link` is unchanged,
-/// and nothing is at `staged`. Throws what `require_room` throws; both are unchanged then.
+/// and no link is at `staged`. Throws what `require_room` throws; both are unchanged then.
 [[nodiscard]] bool replace_symlink(const char* target, const char* link, const char* staged);
 
 }  // namespace fs

@@ -13,9 +13,9 @@ namespace fs {
 /// A handler that adds a message to a failure finds the number in errno: everything in this program
 /// that throws sets it, to 0 where no call failed.
 ///
-/// Never called while a file is open for writing, which only `write_file` does: in a process that
-/// was started without standard error, the line would be written into that file.
-/// Throws nothing, allocates nothing and leaves errno as it was. A failed write is ignored.
+/// Never called while a file is open for writing: in a process that was started without standard
+/// error, the line would be written into it. Throws nothing, allocates nothing and leaves errno as
+/// it was. A failed write is ignored.
 void report(int error, std::string_view format,
             std::initializer_list<const char*> texts = {}) noexcept;
 

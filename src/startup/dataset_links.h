@@ -9,8 +9,8 @@
 /// Throws what `fs::read_symlink` throws.
 [[nodiscard]] std::string latest_dataset_path();
 
-/// The dataset path of the active copy, from "/var/db/timezone/zoneinfo".
-/// Throws what `fs::read_symlink` and `dataset_path_from_link` throw; a missing link is a bad one.
+/// What "/var/db/timezone/zoneinfo" names; a missing link is a bad one. Throws what
+/// `fs::read_symlink` and `dataset_path_from_link` throw.
 [[nodiscard]] std::string current_dataset_path();
 
 /// The dataset path that the zoneinfo link's content `target` names: what comes before its

@@ -41,7 +41,7 @@ void repair_localtime_link() {
   try {
     if (keep_or_correct()) return;
   } catch (...) {
-    // Reported where it was thrown. The reset follows, as it does for a link that is not good.
+    // Reported where it was thrown. The reset follows.
   }
   fs::report(errno, "localtime link invalid; resetting to %s", {"America/Los_Angeles"});
   replace_localtime_link(paths::default_localtime);

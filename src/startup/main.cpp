@@ -20,7 +20,6 @@ void attempt(void (*stage)()) noexcept {
   }
 }
 
-/// When the fallback begins, everything that the selection held has been released.
 void select_dataset_or_reset() {
   try {
     select_dataset();

@@ -2,9 +2,7 @@
 
 #include <cerrno>
 #include <string>
-#include <utility>
 
-#include "dataset/vela_dataset.h"
 #include "fs/file.h"
 #include "fs/report.h"
 #include "paths.h"
@@ -25,25 +23,33 @@ std::string current_path_or_reset() {
 
 }  // namespace
 
+bool may_stay(const vela_dataset& current, const vela_dataset& system) {
+  return current.compatible_schema(system) && !(system > current);
+}
+
+bool may_replace(const vela_dataset& latest, const vela_dataset& current,
+                 const vela_dataset& system) {
+  return latest.compatible_schema(system) && latest > current;
+}
+
 void select_dataset() {
   const vela_dataset system;
-  std::string latest_path = latest_dataset_path();
+  const std::string latest_path = latest_dataset_path();
   const vela_dataset current(current_path_or_reset());
-  current.finish();
-  const vela_dataset* baseline = &current;
-  if (!current.compatible_schema(system) || system > current) {
+  const bool stays = may_stay(current, system);
+  if (stays) {
+    current.finish();
+  } else {
     fs::report(0, "Symlink points at data incompatible with installed system");
     reset_to_system();
-    baseline = &system;
   }
 
   if (latest_path.empty()) return;
-  const vela_dataset latest(std::move(latest_path));
-  // Against the current dataset, not the baseline: a download older than the system copy still
-  // replaces an even older one.
-  if (latest.compatible_schema(system) && latest > current) {
+  const vela_dataset latest(latest_path);
+  if (may_replace(latest, current, system)) {
     // Made first: once the download is active, nothing may fail but the writing.
-    const std::string record = baseline->get_version_string() + "_" + latest.get_version_string();
+    const vela_dataset& baseline = stays ? current : system;
+    const std::string record = baseline.get_version_string() + "_" + latest.get_version_string();
     latest.activate();
     fs::write_file(paths::record, record);
   } else {

@@ -8,8 +8,7 @@
 void prepare_storage();
 
 /// Copies the legacy link "/var/db/icutz" to "/var/db/timezone/icutz" when only the legacy one
-/// exists, then removes the legacy one even if that failed. A link exists when its target does: one
-/// whose target is missing is not removed.
+/// exists, then removes it even if that failed. A link exists when its target does.
 /// Prints "Could not migrate /var/db/icutz to /var/db/timezone/icutz" and
 /// "Could not remove /var/db/icutz".
 void migrate_legacy_icutz();
