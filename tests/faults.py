@@ -9,8 +9,8 @@ from pathlib import Path
 
 from worlds import SCENES, kinds, make
 
-WORLDS = ("steady first_switch first_boot storage_is_a_file older_and_no_newer old_place legacy_moves"
-          " everything_at_once").split()
+WORLDS = ("steady first_switch first_boot zoneinfo_is_a_directory older_and_no_newer old_place"
+          " legacy_moves everything_at_once").split()
 
 # How a call may fail, once or from then on. The kernel's brk has no errors: it returns an end too
 # low. Nor has futex when it wakes: the C library ends a process that sees one.
@@ -39,7 +39,7 @@ def start(fault=""):
 
 # What is there after runs with these faults, one after the other, and a clean run.
 def after(world, *faults):
-    make(SCENES[world][0])
+    make(SCENES[world]["+"])
     for fault in [*faults, ""]:
         end = start(fault).wait()
         assert end in (0, -9 if "KILL" in fault else 0), f"bad end: {world}: {faults}: {end}"
@@ -96,7 +96,7 @@ def traced():
 def crowded(rounds):
     undisturbed = after("new_zone")
     for number in range(rounds):
-        make(SCENES["new_zone"][0])
+        make(SCENES["new_zone"]["+"])
         faults = [f"{call}:delay_enter={random.randrange(15, 60)}000"
                   for call in random.sample(("rename", "symlink", "readlink", "access"), 2)]
         crowd = [start(fault) for fault in faults + [""] * (number % 2)]

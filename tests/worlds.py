@@ -1,5 +1,5 @@
-# Reads tests/worlds.txt, makes the worlds of its scenes, and tests what a run says and changes there.
-# pytest collects it. With a scene's name as argument it makes that world.
+# Reads tests/worlds.txt, whose head explains its form, and tests every scene of it under pytest.
+# With a scene's name as argument it makes that scene's world and no more.
 
 import os
 import re
@@ -14,28 +14,39 @@ if not os.path.isdir("/var/private-world"):
     sys.exit("This rewrites /var/db and /usr/share: run scripts/test.")
 
 TABLE = Path(__file__).with_name("worlds.txt")
-KESTREL = os.environ.get("KESTREL", "build/dev/kestrel")
-LINE = re.compile(r"(\w+) = (.*)|(\w+): (.*?)(?: ! (.*?))?(?: => (.*?))?(?: \| (.*))?")
-ENTRY = re.compile(r"(-?)([^>=%|]+?)(/|\||(?:(>|=|%)(.*)))?")
+STORAGE = "/var/db/timezone"
+# A word of a world: "-" or not, the path, and the sign with what follows it, or at the end.
+ENTRY = re.compile(r"(-?)(.+?)(?:([>=%])(.*)|([/|]))?")
+MODES = {">": 0o777, "=": 0o666, "/": 0o777, "|": 0o666}
+KESTREL = os.path.abspath(os.environ.get("KESTREL", "build/dev/kestrel"))
+os.environ["PATH"] = os.path.dirname(KESTREL) + ":" + os.environ["PATH"]
 
 
+# The scenes by name, each with the lines of each sign.
 def read_scenes():
-    definitions, scenes = {}, {}
-    for line in TABLE.read_text().splitlines():
-        if line and not line.startswith("#"):
-            while re.search(r"\$\w", line):
-                line = re.sub(r"\$(\w+)", lambda use: definitions[use[1]], line)
-            name, text, scene, *parts = LINE.fullmatch(line).groups("")
-            (scenes if scene else definitions)[scene or name] = parts if scene else text
+    meanings, scenes, scene = {}, {}, {}
+    lines = TABLE.read_text().replace("~", STORAGE).splitlines()
+    for line in [line for line in lines if line and not line.startswith("#")]:
+        line = re.sub(r"\$(\w+)", lambda use: meanings[use[1]], line)
+        if line.startswith("  "):
+            sign, _, text = line.strip().partition(" ")
+            scene[sign] += text + "\n"
+        elif meaning := re.fullmatch(r"(\w+) = (.*)", line):
+            meanings[meaning[1]] = meaning[2]
+        else:
+            name, _, world = line.partition(": ")
+            assert world and name not in scenes, f"no scene, or a name for the second time: {line}"
+            scene = scenes[name] = dict.fromkeys(("+", "$", "=>", "1>", "2>", "exit"), "")
+            scene["+"] = world + "\n"
     return scenes
 
 
-# The entries of a text: each path, the sign of its kind ("-" for nothing), and its content.
-def entries(text):
-    for word in text.split():
-        gone, path, what, sign, content = ENTRY.fullmatch(word).groups("")
-        home = "" if path.startswith("/") else "/var/db/timezone/"
-        yield home + path, gone or sign or what, content.replace("~", "/var/db/timezone", sign == ">")
+# The entries of a world: path, sign ("-" for no longer there) and content.
+def entries(world):
+    for word in world.replace("~", STORAGE).split():
+        gone, path, sign, content, end = ENTRY.fullmatch(word).groups("")
+        assert gone or sign or end, f"no entry: {word}"
+        yield os.path.join(STORAGE, path), gone or sign or end, content
 
 
 def make(world):
@@ -50,46 +61,48 @@ def make(world):
          "%": lambda path, content: os.chmod(path, int(content, 8))}[sign](path, content)
 
 
-# All entries: the kind, the content, a file's mode, and the inode.
+# What exists: the sign, the content, the mode and the inode of each path.
 def found():
     state = {}
     for top in (Path("/var/db"), Path("/usr/share")):
         for path in top.rglob("*"):
             status = path.lstat()
-            kind = "/" if path.is_dir() else "|"
+            what = "/" if path.is_dir() else "|", ""
             if path.is_symlink():
-                kind = ">" + os.readlink(path)
+                what = ">", os.readlink(path)
             elif path.is_file():
-                kind = f"={path.read_text('latin-1')} {status.st_mode:o}"
-            state[str(path)] = kind, status.st_ino
+                what = "=", path.read_text("latin-1")
+            state[str(path)] = *what, status.st_mode & 0o7777, status.st_ino
     return state
 
 
-# All entries but the record, with their kinds.
+# What exists without the inodes, and without the record.
 def kinds():
-    return {(path, kind) for path, (kind, _) in found().items() if "Record" not in path}
+    return {(path, what[:3]) for path, what in found().items() if "Record" not in path}
 
 
 SCENES = read_scenes()
 
 
 @pytest.mark.parametrize("name", SCENES)
-def test_world(name):
-    world, command, changes, lines = SCENES[name]
-    make(world)
-    expected = found() | {path: (sign + content.replace("%", " 100") + " 100666" *
-                                 (sign == "=" and "%" not in content), ANY)
-                          for path, sign, content in entries(changes)}
-    powerless = "" if os.geteuid() else "setpriv --bounding-set=-all"
-    command = (command or "kestrel").replace("powerless", powerless).replace("kestrel", KESTREL)
-    ended = subprocess.run(command, shell=True, stderr=subprocess.PIPE, text=True, check=False)
-    if ended.returncode == 77:
-        pytest.skip("not as this user")
-    said = ["kestrel" + line if line.startswith("ctl: ") else "kestrel: " + line
-            for line in lines.split(" / ") if line]
-    assert (ended.stderr.splitlines(), ended.returncode) == (said, 0)
-    assert found() == {path: what for path, what in expected.items() if what[0] != "-"}
+def test_scene(name):
+    scene = SCENES[name]
+    make(scene["+"])
+    expected = found()
+    for path, sign, content in entries(scene["=>"]):
+        if sign == "-":
+            del expected[path]
+        elif sign == "%":
+            expected[path] = *expected[path][:2], int(content, 8), expected[path][3]
+        else:
+            expected[path] = sign, content, MODES[sign], ANY
+    ended = subprocess.run(scene["$"] or "kestrel", shell=True, capture_output=True, text=True,
+                           check=False)
+    status = ended.returncode if ended.returncode >= 0 else 128 - ended.returncode
+    assert (ended.stderr.splitlines(), ended.stdout.splitlines(), status) == (
+        scene["2>"].splitlines(), scene["1>"].splitlines(), int(scene["exit"] or 0))
+    assert found() == expected
 
 
 if __name__ == "__main__":
-    make(SCENES[sys.argv[1]][0])
+    make(SCENES[sys.argv[1]]["+"])
