@@ -10,7 +10,6 @@
 #include "ctl/whole.h"
 #include "dataset/vela_icu.h"
 #include "dataset/vela_version.h"
-#include "dataset/vela_zoneinfo.h"
 #include "fs/file.h"
 #include "fs/operations.h"
 #include "startup/dataset_links.h"
@@ -88,7 +87,6 @@ TEST_F(Files, AndLinksAreReadUpToALimit) {
   EXPECT_EQ(first_word_of(std::string(" \t\n\v\f\ra\0b\rc", 11)), std::string("a\0b", 3));
   EXPECT_EQ(first_word_of(std::string(10000, '\n') + word + std::string(9000, ' ') + "x"), word);
   EXPECT_EQ(first_word_of(std::string(64 << 20, ' ') + "2022a "), "");
-  EXPECT_EQ(fs::read_first_word("/dev/zero"), "");
   ASSERT_EQ(::symlink(std::string(1500, 'x').c_str(), (folder + "/link").c_str()), 0);
   EXPECT_EQ(fs::read_symlink((folder + "/link").c_str()), std::string(1024, 'x'));
 }
@@ -129,11 +127,6 @@ TEST(Whole, Bundles) {
     for (std::size_t size = 0; size < bundle.size(); ++size)
       EXPECT_FALSE(is_whole_bundle(bundle.substr(0, size))) << big << ' ' << size;
   }
-}
-
-TEST(Components, OnlyZoneinfoServesInAnyPlace) {
-  EXPECT_TRUE(vela_zoneinfo().compatible_schema(vela_icu()));
-  EXPECT_FALSE(vela_icu().compatible_schema(vela_zoneinfo()));
 }
 
 }  // namespace
