@@ -7,7 +7,9 @@
 #include <regex>
 #include <sstream>
 
-#include "ctl/whole.h"
+#include "ctl/bundle.h"
+#include "ctl/files.h"
+#include "ctl/tzif.h"
 #include "dataset/vela_icu.h"
 #include "dataset/vela_version.h"
 #include "fs/file.h"
@@ -38,7 +40,6 @@ TEST(Texts, ScannersFollowTheirPatterns) {
                                 "`", "{",  "A", " ", "l",  "b", "e",  "icutz", ".dat"};
   std::mt19937 random(2022);
   std::smatch match;
-  testing::internal::CaptureStderr();
   for (int round = 0; round < 20000; ++round) {
     std::string text;
     for (auto count = random() % 5; count > 0; --count)
@@ -53,7 +54,6 @@ TEST(Texts, ScannersFollowTheirPatterns) {
       EXPECT_THROW(static_cast<void>(dataset_path_from_link(target)), int) << target;
     }
   }
-  testing::internal::GetCapturedStderr();
 }
 
 /// What random texts hardly ever are.
@@ -105,16 +105,34 @@ TEST_F(Files, TheFirstFitFileOfADirectoryCounts) {
 
 /// No part of a zone is whole, nor one with more behind it or without the start of its footer.
 TEST(Whole, Zones) {
-  std::string zone = content_of("/usr/share/zoneinfo/Asia/Tokyo");
+  std::string zone = read_file("/usr/share/zoneinfo/Asia/Tokyo").value_or("");
   EXPECT_TRUE(is_whole_zone(zone));
   EXPECT_FALSE(is_whole_zone(zone + "\n"));
   for (std::size_t size = 0; size < zone.size(); ++size)
     EXPECT_FALSE(is_whole_zone(zone.substr(0, size))) << size;
   EXPECT_FALSE(is_whole_zone("x" + zone.substr(1)));
   EXPECT_FALSE(is_whole_zone(zone.replace(zone.rfind('\n', zone.size() - 2), 1, "x")));
-  const std::string head = "TZif" + std::string(19, '\0') + '\1' + std::string(7, '\0') + '\1';
-  EXPECT_TRUE(is_whole_zone(head + std::string("\0\0\0\0\0\0\0\1\0\0\0\4type  UTC leap    1", 31)));
-  EXPECT_FALSE(is_whole_zone(head + std::string(4 + 8 + 8 + 1, '\0')));
+}
+
+/// A zone with one transition, two types, the abbreviations "A" and "UTC", and these bytes.
+std::string zone_of(char type_of_transition, char flag, char abbreviation, char indicators) {
+  const std::string counts = {0, 0, 0, indicators, 0, 0, 0, 0, 0, 0, 0, 1,
+                              0, 0, 0, 1,          0, 0, 0, 2, 0, 0, 0, 6};
+  const std::string times_and_types = {0, 0, 0, 9, type_of_transition, 0, 0, 0, 0, 0, 0};
+  const std::string last_type_and_names = {0,   0, 0,   1,   flag, abbreviation,
+                                           'A', 0, 'U', 'T', 'C',  0};
+  return "TZif" + std::string(16, '\0') + counts + times_and_types + last_type_and_names +
+         std::string(8 + static_cast<std::size_t>(indicators), '\0');
+}
+
+TEST(Whole, TablesOfAZone) {
+  EXPECT_TRUE(is_whole_zone(zone_of(1, 1, 5, 2)));
+  EXPECT_FALSE(is_whole_zone(zone_of(2, 1, 5, 2))) << "a transition to a third type";
+  EXPECT_FALSE(is_whole_zone(zone_of(1, 2, 5, 2))) << "neither standard nor daylight time";
+  EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 6, 2))) << "an abbreviation behind the table";
+  EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 5, 1))) << "an indicator for one of two types";
+  EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 5, 0).replace(43, 1, "\5"))) << "a name without an end";
+  EXPECT_FALSE(is_whole_zone("TZif" + std::string(40, '\0'))) << "no type";
 }
 
 TEST(Whole, Bundles) {
@@ -124,6 +142,8 @@ TEST(Whole, Bundles) {
     bundle[8] = big ? '\1' : '\0';
     bundle[big ? 32 + 19 : 32 + 16] = '\6';
     EXPECT_TRUE(is_whole_bundle(bundle)) << big;
+    EXPECT_EQ(has_byte_order_of("44l", bundle), !big);
+    EXPECT_EQ(has_byte_order_of("44e", bundle), big);
     for (std::size_t size = 0; size < bundle.size(); ++size)
       EXPECT_FALSE(is_whole_bundle(bundle.substr(0, size))) << big << ' ' << size;
   }

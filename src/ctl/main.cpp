@@ -1,42 +1,121 @@
 #include <sys/stat.h>
 
-#include <exception>
+#include <cerrno>
+#include <cstddef>
+#include <functional>
 #include <iostream>
 #include <string>
+#include <system_error>
 #include <vector>
 
-#include "ctl/change.h"
-#include "ctl/status.h"
-#include "ctl/whole.h"
+#include "ctl/commands.h"
+#include "ctl/device.h"
+#include "ctl/print.h"
+#include "ctl/reports.h"
+#include "ctl/workplace.h"
 
 namespace {
 
-constexpr const char* usage =
-    "usage: kestrelctl status | publish VERSION DIRECTORY | back [VERSION] | prune";
+using words = std::vector<std::string>;
 
-using line = std::vector<std::string>;
+/// A command. Its arguments are as many as the two numbers say; a version comes first.
+struct command {
+  const char* name;
+  const char* usage;
+  std::size_t least;
+  std::size_t most;
+  bool takes_version;
+  bool changes_storage;
+  std::function<outcome(const words&)> run;
+};
 
-int run(const line& words) {
-  if (words == line{"status"}) return status() ? 0 : 1;
-  if (words.size() == 3 && words[0] == "publish") return publish(words[1], words[2]) ? 0 : 1;
-  if (words == line{"back"}) return go_back("") ? 0 : 1;
-  if (words.size() == 2 && words[0] == "back" && words[1] > "") return go_back(words[1]) ? 0 : 1;
-  if (words == line{"prune"}) return prune() ? 0 : 1;
-  if (words == line{"--version"}) return std::cout << "kestrelctl " KESTREL_VERSION "\n" ? 0 : 1;
-  if (words == line{"--help"}) return std::cout << usage << '\n' ? 0 : 1;
-  return complain(usage) ? 0 : 2;
+const std::vector<command>& commands() {
+  static const std::vector<command> all = {
+      {"status", "", 0, 0, false, false, [](const words&) { return print_status(); }},
+      {"publish", " VERSION DIRECTORY", 2, 2, true, true,
+       [](const words& arguments) { return publish(arguments[0], arguments[1]); }},
+      {"back", " [VERSION]", 0, 1, true, true,
+       [](const words& arguments) { return go_back(arguments.empty() ? "" : arguments[0]); }},
+      {"prune", "", 0, 0, false, true, [](const words&) { return prune(); }},
+      {"zone", " NAME", 1, 1, false, true,
+       [](const words& arguments) { return set_zone(arguments[0]); }},
+  };
+  return all;
+}
+
+std::string usage() {
+  std::string text;
+  for (const command& each : commands())
+    text += (text.empty() ? "usage: kestrelctl " : " | ") + (each.name + std::string(each.usage));
+  return text;
+}
+
+/// The three steps before every change: whose rights, whether it is safe, who else is at work.
+outcome change(const command& chosen, const words& arguments) {
+  become_storage_owner();
+  if (const faults found = faults_of_storage(); !found.empty())
+    return refuse({outcome::failed, found});
+  const storage_lock lock;
+  if (!lock.is_held())
+    return refuse(
+        {outcome::not_now, {{"another kestrelctl is at work", "start again when it has ended"}}});
+  clear_leftovers();
+  return chosen.run(arguments);
+}
+
+outcome run(const command& chosen, const words& arguments) {
+  if (arguments.size() < chosen.least || arguments.size() > chosen.most)
+    return refuse({outcome::wrong_usage, {{usage()}}});
+  if (chosen.takes_version && !arguments.empty() && version_of(arguments[0]) == vela_version())
+    return refuse({outcome::wrong_usage,
+                   {{arguments[0] + " is no version", "a version is such as 2026b.1.0"}}});
+  if (chosen.changes_storage) return change(chosen, arguments);
+  become_storage_owner();
+  return chosen.run(arguments);
+}
+
+outcome run(const words& line) {
+  const std::string name = line.empty() ? "" : line[0];
+  for (const command& each : commands())
+    if (name == each.name) return run(each, {line.begin() + 1, line.end()});
+  if (line == words{"--version"}) {
+    say("kestrelctl " KESTREL_VERSION);
+  } else if (line == words{"--help"}) {
+    say(usage());
+  } else {
+    return refuse({outcome::wrong_usage, {{usage()}}});
+  }
+  return outcome::done;
+}
+
+/// What a system call that failed with this number leads to.
+outcome status_of(int error) {
+  if (error != ENOSPC && error != EDQUOT) return outcome::failed;
+  complain({"there is no room", "kestrelctl prune makes some"});
+  return outcome::not_now;
+}
+
+outcome run_or_explain(const words& line) {
+  try {
+    return run(line);
+  } catch (const std::system_error& failure) {
+    complain({failure.what()});
+    return status_of(failure.code().value());
+  } catch (const std::exception& failure) {
+    complain({failure.what()});
+  } catch (int error) {
+    complain_all(take_reports());
+    return status_of(error);
+  }
+  return outcome::failed;
 }
 
 }  // namespace
 
 int main(int count, char** arguments) {
-  ::umask(S_IWGRP | S_IWOTH);  // a download is for everyone to read
-  try {
-    const int status = run({arguments + 1, arguments + count});
-    return std::cout.flush() || complain("standard output cannot be written") ? status : 1;
-  } catch (const std::exception& failure) {
-    return complain(failure.what()) ? 0 : 1;
-  } catch (int) {
-    return 1;  // printed where it was thrown
-  }
+  ::umask(S_IWGRP | S_IWOTH);  // what is made is for everyone to read
+  const outcome end = run_or_explain({arguments + 1, arguments + count});
+  if (std::cout.flush()) return static_cast<int>(end);
+  complain({"standard output cannot be written"});
+  return static_cast<int>(outcome::failed);
 }

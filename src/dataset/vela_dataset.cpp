@@ -43,11 +43,10 @@ void vela_dataset::activate() const {
   const std::string icu = icu_directory(path);
   // Both are staged before either link changes. The ICU link is staged for the system copy as well,
   // which has none: if this run is killed in between, the next one sees by it what to finish.
-  if (!fs::stage_symlink(tree.c_str(), paths::new_zoneinfo_link)) {
+  if (!fs::stage_symlink(tree.c_str(), paths::new_zoneinfo_link))
     fs::require_room(tree.c_str(), paths::zoneinfo_link);
-  } else if (!fs::stage_symlink(icu.c_str(), paths::new_icu_link) && !path.empty()) {
+  if (!fs::stage_symlink(icu.c_str(), paths::new_icu_link) && !path.empty())
     fs::require_room(icu.c_str(), paths::icu_link);
-  }
   try {
     for (const auto& component : components) component->activate();
   } catch (...) {

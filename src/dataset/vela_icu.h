@@ -12,6 +12,9 @@ class vela_icu final : public vela_dataset_component {
   /// The data of the dataset at `path`, the system copy's for "". Throws what `initialize` throws.
   explicit vela_icu(const std::string& path = {});
 
+  /// Empty where none was found.
+  [[nodiscard]] const std::string& get_schema() const { return schema; }
+
   /// Whether `other` is ICU data of the same schema. Anything but ICU data prints
   /// "vela_icu::compatible_schema: could not dynamic_cast other component".
   [[nodiscard]] bool compatible_schema(const vela_dataset_component& other) const override;
@@ -23,10 +26,10 @@ class vela_icu final : public vela_dataset_component {
   void activate() const override;
 
  private:
-  /// Finds the schema: the first word of the system copy's "icutzformat.txt", or, for a download,
-  /// that in the name of the first data file listed in its directory: a regular file, readable by
-  /// others. A download without one prints "No ICU schema found for %s". Without memory for reading
-  /// the directory, prints "tz_icu::initialize: fts_open of %s failed, %s" and throws `int`.
+  /// Finds the schema: the first word of the system copy's "icutzformat.txt"; in a download, that
+  /// in the name of the first listed data file that is regular and readable by others. A download
+  /// without one prints "No ICU schema found for %s". Without memory for reading the directory,
+  /// prints "tz_icu::initialize: fts_open of %s failed, %s" and throws `int`.
   void initialize();
 
   std::string schema;

@@ -1,5 +1,6 @@
 #include "fs/operations.h"
 
+#include <sys/stat.h>
 #include <sys/statfs.h>
 #include <unistd.h>
 
@@ -75,8 +76,8 @@ bool stage_symlink(const char* target, const char* staged) noexcept {
 
 void unstage_symlink(const char* staged) noexcept {
   const int error = errno;
-  char ignored = '\0';
-  if (::readlink(staged, &ignored, 1) >= 0) ::unlink(staged);
+  struct stat found {};
+  if (::lstat(staged, &found) != 0 || S_ISLNK(found.st_mode)) ::unlink(staged);
   errno = error;
 }
 

@@ -16,10 +16,9 @@ void remove(const char* path);
 /// failure, whose number is then in errno. Prints and throws nothing.
 [[nodiscard]] bool exists(const char* path) noexcept;
 
-/// The content of the link at `path`, as stored; no more than its first 1024 bytes.
-/// Empty when nothing exists at `path`.
-/// On failure (not a link, for example) prints "read_symlink: %s" and throws `int`. Without memory
-/// for the content throws std::bad_alloc.
+/// The content of the link at `path`, as stored; no more than its first 1024 bytes. Empty when
+/// nothing exists at `path`. Without memory for it throws std::bad_alloc.
+/// On failure (not a link, for example) prints "read_symlink: %s" and throws `int`.
 [[nodiscard]] std::string read_symlink(const char* path);
 
 /// Makes a link at `link` with the content `target`, which need not exist. Replaces nothing:
@@ -32,13 +31,12 @@ void create_symlink(const char* target, const char* link);
 [[nodiscard]] bool is_symlink_to(const char* target, const char* link) noexcept;
 
 /// Makes sure that a link with the content `target` is at `staged`, the name beside a link that is
-/// to be replaced. One with that content may be there already, from another run; any other link is
-/// removed first.
-/// False where the link cannot be made, for example because something that is no link is there,
-/// with the number in errno. Prints and throws nothing.
+/// to be replaced. Another run may have made it already; any other link is removed first.
+/// False where it cannot be made, for example because something that is no link is there, with the
+/// number in errno. Prints and throws nothing.
 [[nodiscard]] bool stage_symlink(const char* target, const char* staged) noexcept;
 
-/// Removes the link at `staged`; what is no link stays. Silent; leaves errno as it was.
+/// Removes the link at `staged`; what is seen to be no link stays. Silent; leaves errno as it was.
 void unstage_symlink(const char* staged) noexcept;
 
 /// To be called when a link could not be staged or renamed. If errno says that the storage is full,

@@ -1,7 +1,6 @@
 #pragma once
 
-// The stages that prepare the storage before any dataset is read. Each prints nothing when nothing
-// is wrong, and throws nothing for a failed system call.
+// The stages before any dataset is read. None prints when nothing is wrong, or throws `int`.
 
 /// Gives "/var/db/timezone/" and "/var/db/timezone/tz/" the data-protection class without
 /// protection, where the platform has such classes. Skips a directory that cannot be opened.

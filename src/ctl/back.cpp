@@ -1,0 +1,69 @@
+#include <system_error>
+
+#include "ctl/commands.h"
+#include "ctl/device.h"
+#include "ctl/diagnosis.h"
+#include "ctl/print.h"
+#include "ctl/withdrawn.h"
+#include "ctl/workplace.h"
+#include "dataset/vela_dataset.h"
+#include "fs/operations.h"
+#include "paths.h"
+
+namespace {
+
+/// The list after the way back to `version`, "" for the system copy: with the higher versions that
+/// it leaves, and without `version`.
+version_set withdrawn_after(const device& now, const std::string& version) {
+  const vela_version target = version_of(version.empty() ? now.system_version : version);
+  version_set withdrawn = now.withdrawn;
+  const bool is_download_active = !now.view.current_path.value_or("").empty();
+  if (is_download_active && version_of(now.active_version) > target)
+    withdrawn.insert(now.active_version);
+  if (version_of(now.latest_version) > target) withdrawn.insert(now.latest_version);
+  withdrawn.erase(version);
+  return withdrawn;
+}
+
+/// The way back has priority: where the list cannot be written, it goes on.
+void withdraw(const device& now, const version_set& withdrawn) {
+  if (withdrawn == now.withdrawn) return;
+  try {
+    write_withdrawn(withdrawn);
+  } catch (const std::system_error& failure) {
+    for (const std::string& version : withdrawn)
+      if (!now.withdrawn.contains(version))
+        complain(
+            {version + " is not withdrawn, and a downloader may publish it again", failure.what()});
+  }
+}
+
+}  // namespace
+
+outcome go_back(const std::string& version) {
+  const device now = read_device();
+  const std::string path = version.empty() ? "" : path_of(version);
+  if (const faults found = faults_of_link_places(now); !found.empty())
+    return refuse({outcome::failed, found});
+  if (const faults found = faults_of_way_back(now, version); !found.empty())
+    return refuse({outcome::unusable, found});
+  withdraw(now, withdrawn_after(now, version));
+  // Named first, so that no run in between undoes the rest.
+  if (path.empty()) {
+    fs::remove(paths::latest_link);
+  } else {
+    replace_link(path, paths::latest_link, new_latest_link);
+  }
+  vela_dataset(path).activate();
+  sync_file_system(paths::storage);
+
+  const device then = read_device();
+  const std::string name = path.empty() ? then.system_version : version;
+  if (is_active(then, path)) {
+    say(name + " is active");
+    return outcome::done;
+  }
+  complain({name + " is not active", "see the next lines"});
+  complain_all(faults_of(then));
+  return outcome::failed;
+}

@@ -1,0 +1,23 @@
+#pragma once
+
+#include <string>
+
+#include "ctl/fault.h"
+
+/// What makes a copy of the data unfit for its readers. `path` is the directory of a download,
+/// empty for the system copy; `version` is its version text; `shown` is how the lines call `path`.
+///
+/// Looked at is every entry: that a zone and a bundle is whole, no other file is empty, everyone
+/// can read it, and no link leads out of the copy or nowhere (a link that the system copy has as
+/// well is the image's own). In a download also: the release in "+VERSION" and "tzdata.zi", the
+/// schema and the byte order of the bundles, and that nothing is missing that the system copy has.
+///
+/// A fault has a cure of its own where other modes are enough; otherwise the data has to come anew.
+[[nodiscard]] faults faults_of_copy(const std::string& path, const std::string& version,
+                                    const std::string& shown);
+
+/// Whether the copy at `path` has the zone `name`, such as Europe/Paris, and that is whole.
+[[nodiscard]] bool has_zone(const std::string& path, const std::string& name);
+
+/// The release of a version: 2026b for 2026b.1.0.
+[[nodiscard]] std::string release_of(const std::string& version);

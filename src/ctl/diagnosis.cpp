@@ -1,0 +1,269 @@
+#include "ctl/diagnosis.h"
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <filesystem>
+#include <system_error>
+
+#include "ctl/completeness.h"
+#include "ctl/files.h"
+#include "ctl/reports.h"
+#include "dataset/vela_icu.h"
+#include "dataset/vela_zoneinfo.h"
+#include "fs/operations.h"
+#include "paths.h"
+#include "startup/select_dataset.h"
+
+namespace {
+
+constexpr const char* repair = "repair the image";
+constexpr const char* start = "start a run of kestrel";
+constexpr const char* set_zone = "kestrelctl zone NAME";
+
+void append(faults& all, const faults& more) {
+  all.insert(all.end(), more.begin(), more.end());
+}
+
+bool is_directory(const std::string& path) {
+  std::error_code error;
+  return std::filesystem::is_directory(path, error);
+}
+
+bool is_other_than_link(const char* path) {
+  return is_there(path) && link_target(path).empty();
+}
+
+/// The faults, with that cure for those that have none of their own.
+faults with_cure(faults all, const std::string& cure) {
+  for (fault& one : all)
+    if (one.cure.empty()) one.cure = cure;
+  return all;
+}
+
+std::string way_back_to(const device& now) {
+  return now.view.current_path.value_or("").empty() ? "kestrelctl back"
+                                                    : "kestrelctl back " + now.active_version;
+}
+
+/// The copies that programs and runs read, as far as they are known.
+std::vector<std::string> places_of_copies(const device& now) {
+  std::vector<std::string> places = {paths::system_zoneinfo, paths::system_icu, paths::storage,
+                                     paths::downloads};
+  for (const auto& path : {now.view.current_path, now.view.latest_path})
+    if (path && path->starts_with(paths::downloads))
+      places.insert(places.end(), {*path, zoneinfo_directory(*path), icu_directory(*path)});
+  return places;
+}
+
+faults faults_of_places(const device& now) {
+  faults found;
+  for (const std::string& place : places_of_copies(now)) {
+    const std::string closed = closed_part(place);
+    const fault one{"not everyone can read " + closed, "chmod a+rX it"};
+    const auto is_same = [&one](const fault& other) { return other.what == one.what; };
+    if (!closed.empty() && std::ranges::none_of(found, is_same)) found.push_back(one);
+  }
+  return found;
+}
+
+faults faults_of_system(const device& now) {
+  const std::string release = release_of(now.system_version);
+  const std::string& schema = now.system_schema;
+  faults found;
+  if (!is_directory(paths::system_zoneinfo)) {
+    found.push_back({std::string(paths::system_zoneinfo) + " is missing", repair});
+  } else if (now.system_version == ".1.0") {
+    found.push_back(
+        {std::string(system_version_file) + " is missing, empty or unreadable", repair});
+  } else if (version_of(now.system_version) == vela_version()) {
+    found.push_back(
+        {std::string(system_version_file) + " does not name a release such as 2026b", repair});
+  }
+  if (schema.empty()) {
+    found.push_back({std::string(schema_file) + " is missing, empty or unreadable", repair});
+  } else if (data_file_schema("icutz" + schema + ".dat") != schema) {
+    found.push_back({std::string(schema_file) + " does not name a schema such as 44l", repair});
+  }
+  return found;
+}
+
+/// Both schemas, or the versions, where a run does not keep the copy at `path`.
+faults faults_of_fitness(const device& now, const std::string& path, const vela_dataset& copy) {
+  const std::string schema = vela_icu(path).get_schema();
+  if (!now.view.system || may_stay(copy, *now.view.system)) return {};
+  const std::string file = path + "/icutz/icutz" + now.system_schema + ".dat";
+  if (schema.empty() && is_there(file) && !closed_part(file).empty())
+    return {{"not everyone can read " + closed_part(file), "chmod a+rX it"}};
+  if (schema.empty()) return {{file + ", the schema's file, is missing"}};
+  if (schema != now.system_schema)
+    return {
+        {path + " has schema " + schema + ", and " + schema_file + " says " + now.system_schema}};
+  return {{path + " is older than the system copy, " + now.system_version}};
+}
+
+faults faults_of_active_links(const device& now) {
+  const std::string zoneinfo = paths::zoneinfo_link;
+  if (!is_there(zoneinfo)) return {{zoneinfo + " is missing", start}};
+  if (is_other_than_link(paths::zoneinfo_link)) return {};  // see faults_of_link_places
+  if (!now.view.current_path)
+    return {{zoneinfo + " leads to " + now.zoneinfo_target + ", which is no copy", start}};
+  const std::string& path = *now.view.current_path;
+  if (now.zoneinfo_target != zoneinfo_directory(path))
+    return {{zoneinfo + " leads to " + now.zoneinfo_target + ", which no program expects",
+             way_back_to(now)}};
+  if (!is_active(now, path) && !is_other_than_link(paths::icu_link))
+    return {{std::string(paths::icu_link) + " is not that of the active copy", way_back_to(now)}};
+  return {};
+}
+
+faults faults_of_active(const device& now) {
+  if (!now.view.current_path) return {};
+  const std::string& path = *now.view.current_path;
+  faults found;
+  if (!path.empty()) {
+    if (!is_directory(path)) return {{path + " is missing", start}};
+    if (!now.view.current || version_of(now.active_version) == vela_version())
+      return {{path + " has a name that is no version", start}};
+    found = faults_of_fitness(now, path, *now.view.current);
+    if (!found.empty()) return with_cure(found, start);
+  }
+  const std::string anew =
+      path.empty() ? repair : "publish " + now.active_version + " again, from good data";
+  const std::string shown = path.empty() ? paths::system_zoneinfo : path;
+  return with_cure(faults_of_copy(path, now.active_version, shown), anew);
+}
+
+faults faults_of_latest(const device& now) {
+  const std::string latest = paths::latest_link;
+  const std::string& target = now.latest_target;
+  const std::string cure = "remove " + latest;
+  if (is_other_than_link(paths::latest_link)) return {{latest + " is no link", "remove it"}};
+  if (target.empty() || target == now.view.current_path) return {};
+  if (!target.starts_with(paths::downloads) || now.latest_version == target)
+    return {{latest + " leads to " + target + ", which is no path of a download", cure}};
+  if (version_of(now.latest_version) == vela_version())
+    return {{latest + " names " + now.latest_version + ", which is no version", cure}};
+  if (!is_directory(target)) return {{target + ", the newest download, is missing", cure}};
+  faults found;
+  if (now.view.latest && now.view.system && !now.view.latest->compatible_schema(*now.view.system))
+    found = faults_of_fitness(now, target, *now.view.latest);
+  return with_cure(found, cure);
+}
+
+faults faults_of_next_run(const device& now) {
+  using enum next_run::action;
+  if (now.next.what == keeps) return {};
+  const std::string line = "the next run of kestrel ";
+  if (now.next.what != fails) return {{line + to_text(now.next), start}};
+  faults found = {{line + "fails", "see the other lines"}};
+  if (!now.view.can_change_storage)
+    found.push_back({std::string(paths::storage) + " is missing, read-only, or append-only",
+                     "make it a directory that can be changed"});
+  return found;
+}
+
+/// What a run has still to do that no other fault is about.
+faults faults_of_remains(const device& now) {
+  const std::string path = now.view.current_path.value_or("");
+  faults found;
+  if (fs::is_symlink_to(icu_directory(path).c_str(), paths::new_icu_link))
+    found.push_back({std::string(paths::new_icu_link) + " is of a run that was killed", start});
+  if (fs::exists(paths::legacy_icu_link))
+    found.push_back({std::string(paths::legacy_icu_link) + " is of an older system", "remove it"});
+  std::error_code error;
+  if (is_there(paths::legacy_icu) &&
+      (!is_directory(paths::legacy_icu) || std::filesystem::is_empty(paths::legacy_icu, error)))
+    found.push_back({std::string(paths::legacy_icu) + " is of an older system", "remove it"});
+  return found;
+}
+
+faults faults_of_zone(const device& now) {
+  const std::string localtime = paths::localtime_link;
+  if (is_other_than_link(paths::localtime_link))
+    return {{localtime + " is no link", std::string("remove it, and ") + set_zone}};
+  if (now.localtime_target.empty()) return {{localtime + " is missing", set_zone}};
+  if (now.zone.empty())
+    return {{localtime + " leads to " + now.localtime_target + ", not into " + paths::zoneinfo_link,
+             set_zone}};
+  if (!now.view.current_path || has_zone(*now.view.current_path, now.zone)) return {};
+  const std::string file = zoneinfo_directory(*now.view.current_path) + "/" + now.zone;
+  std::error_code error;
+  if (std::filesystem::is_regular_file(file, error)) return {};  // see faults_of_active
+  return {{"the local zone " + now.zone + " is not in the active copy", set_zone}};
+}
+
+/// Programs find the links by these, which the image sets.
+faults faults_of_entrance(const std::string& entrance, const std::string& link) {
+  const std::filesystem::path target =
+      std::filesystem::path(entrance).parent_path() / link_target(entrance);
+  if (target.lexically_normal() == link) return {};
+  return {{entrance + " does not lead to " + link, "ln -sfn " + link + " " + entrance}};
+}
+
+}  // namespace
+
+faults faults_of(const device& now) {
+  faults found = faults_of_places(now);
+  if (is_blind(now)) return found;
+  for (const auto& subject :
+       {faults_of_system, faults_of_link_places, faults_of_active_links, faults_of_active,
+        faults_of_latest, faults_of_next_run, faults_of_remains, faults_of_zone})
+    append(found, subject(now));
+  append(found, faults_of_entrance("/etc/localtime", paths::localtime_link));
+  append(found, faults_of_entrance(paths::legacy_zoneinfo, paths::zoneinfo_link));
+  static_cast<void>(take_reports());
+  return found;
+}
+
+bool is_blind(const device& now) {
+  const auto is_closed_to_us = [](const std::string& place) {
+    return ::faccessat(AT_FDCWD, place.c_str(), R_OK | X_OK, AT_EACCESS) != 0 && errno == EACCES;
+  };
+  return std::ranges::any_of(places_of_copies(now), is_closed_to_us);
+}
+
+faults faults_of_link_places(const device& now) {
+  const std::string zoneinfo = paths::zoneinfo_link;
+  const std::string icutz = paths::icu_link;
+  faults found;
+  if (is_other_than_link(paths::zoneinfo_link))
+    found.push_back({zoneinfo + " is no link", std::string("remove it, and ") + start});
+  if (is_other_than_link(paths::icu_link))
+    found.push_back({icutz + " is no link", "remove it, and " + way_back_to(now)});
+  return found;
+}
+
+faults faults_of_way_back(const device& now, const std::string& version) {
+  const std::string path = version.empty() ? "" : path_of(version);
+  if (!now.view.system)
+    return {{std::string(system_version_file) + " does not name a release", repair}};
+  faults found;
+  if (!path.empty()) {
+    if (!is_directory(path)) return {{path + " is missing"}};
+    found = faults_of_fitness(now, path, vela_dataset(path));
+    if (found.empty()) found = faults_of_copy(path, version, path);
+  }
+  if (found.empty() && !now.zone.empty() && !has_zone(path, now.zone))
+    found.push_back({zoneinfo_directory(path) + " has not the local zone, " + now.zone});
+  static_cast<void>(take_reports());
+  return found;
+}
+
+std::vector<std::string> downloads_to_go_back_to(const device& now) {
+  std::vector<std::string> versions;
+  std::error_code error;
+  std::filesystem::directory_iterator entry(paths::downloads, error);
+  for (const std::filesystem::directory_iterator end; !error && entry != end;
+       entry.increment(error)) {
+    const std::string version = entry->path().filename();
+    if (version_of(version) != vela_version() && faults_of_way_back(now, version).empty())
+      versions.push_back(version);
+  }
+  std::ranges::sort(versions, [](const std::string& one, const std::string& other) {
+    return version_of(one) < version_of(other);
+  });
+  return versions;
+}

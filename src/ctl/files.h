@@ -1,0 +1,28 @@
+#pragma once
+
+#include <filesystem>
+#include <optional>
+#include <string>
+
+// Looking at files that anybody may have made. Nothing here waits, throws std::bad_alloc at most,
+// or prints.
+
+/// The content of the regular file at `path`, links followed. Nothing where it cannot be read, is a
+/// FIFO or a device, which is not opened, or has more than 16 MiB.
+[[nodiscard]] std::optional<std::string> read_file(const std::string& path);
+
+/// The content of the link at `path`; empty where there is none, or it cannot be read.
+[[nodiscard]] std::string link_target(const std::string& path);
+
+/// Whether an entry is at `path`, even a link that leads nowhere.
+[[nodiscard]] bool is_there(const std::string& path);
+
+/// What not everyone can read: `path`, links followed, or the first directory on the way there that
+/// not everyone can pass. Empty where everyone can read it, or nothing is there.
+[[nodiscard]] std::string closed_part(const std::string& path);
+
+/// Where `inside`, a path relative to the directory `top`, leads. Its links are followed one by
+/// one, and none may leave `top`, not even to come back: then it leads to the same wherever `top`
+/// is. Nothing where it leads out, nowhere, or round in a circle.
+[[nodiscard]] std::optional<std::filesystem::path> resolve_inside(
+    const std::filesystem::path& top, const std::filesystem::path& inside);

@@ -1,0 +1,69 @@
+#include <filesystem>
+#include <set>
+#include <system_error>
+#include <vector>
+
+#include "ctl/commands.h"
+#include "ctl/device.h"
+#include "ctl/diagnosis.h"
+#include "ctl/files.h"
+#include "ctl/print.h"
+#include "ctl/workplace.h"
+#include "paths.h"
+
+namespace {
+
+using std::filesystem::directory_iterator;
+
+/// Adds the name of the entry of tz/ through which a link goes, as it is written and as it ends.
+void add_linked(std::set<std::string>& names, const std::filesystem::path& link) {
+  const std::filesystem::path downloads = paths::downloads;
+  const std::filesystem::path target = link.parent_path() / link_target(link);
+  std::error_code error;
+  for (const auto& way : {target.lexically_normal(), std::filesystem::canonical(target, error)})
+    if (const auto inside = way.lexically_relative(downloads); !inside.empty())
+      names.insert(*inside.begin());
+}
+
+/// The names in tz/ that a link in the storage or in tz/ leads to.
+std::set<std::string> linked_names() {
+  std::set<std::string> names;
+  for (const char* const directory : {paths::storage, paths::downloads})
+    for (const auto& entry : directory_iterator(directory))
+      if (entry.is_symlink()) add_linked(names, entry.path());
+  return names;
+}
+
+/// The downloads that no link leads to.
+std::set<std::string> unlinked_downloads() {
+  const std::set<std::string> linked = linked_names();
+  std::set<std::string> names;
+  for (const auto& entry : directory_iterator(paths::downloads)) {
+    const std::string name = entry.path().filename();
+    const bool is_download =
+        std::filesystem::is_directory(entry.symlink_status()) && version_of(name) != vela_version();
+    if (is_download && !linked.contains(name)) names.insert(name);
+  }
+  return names;
+}
+
+}  // namespace
+
+outcome prune() {
+  std::set<std::string> superfluous = unlinked_downloads();
+  std::string kept;
+  for (const std::string& version : downloads_to_go_back_to(read_device()))
+    if (superfluous.contains(version)) kept = version;  // the newest one comes last
+  superfluous.erase(kept);
+
+  outcome end = outcome::done;
+  for (const std::string& version : superfluous) {
+    try {
+      remove_and_say(path_of(version));
+    } catch (const std::system_error& failure) {
+      complain({path_of(version) + " cannot be removed", failure.code().message()});
+      end = outcome::failed;
+    }
+  }
+  return end;
+}

@@ -1,0 +1,42 @@
+#include "ctl/withdrawn.h"
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <sstream>
+
+#include "ctl/files.h"
+#include "ctl/workplace.h"
+#include "fs/descriptor.h"
+#include "paths.h"
+
+version_set read_withdrawn() {
+  std::istringstream lines(read_file(withdrawn_list).value_or(""));
+  version_set versions;
+  for (std::string version; lines >> version;) versions.insert(version);
+  return versions;
+}
+
+void write_withdrawn(const version_set& versions) {
+  if (versions.empty()) {
+    check(::unlink(withdrawn_list) == 0 || errno == ENOENT, withdrawn_list);
+    return;
+  }
+  std::string lines;
+  for (const std::string& version : versions) lines += version + "\n";
+  static_cast<void>(::unlink(new_withdrawn_list));
+  const fs::descriptor file(
+      ::open(new_withdrawn_list, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0644));
+  check(file.is_open(), new_withdrawn_list);
+  try {
+    const ssize_t written = ::write(file.get(), lines.data(), lines.size());
+    check(written == static_cast<ssize_t>(lines.size()) && ::fsync(file.get()) == 0,
+          new_withdrawn_list);
+    check(::rename(new_withdrawn_list, withdrawn_list) == 0, withdrawn_list);
+  } catch (...) {
+    static_cast<void>(::unlink(new_withdrawn_list));
+    throw;
+  }
+  const fs::descriptor storage(::open(paths::storage, O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  check(storage.is_open() && ::fsync(storage.get()) == 0, paths::storage);
+}

@@ -1,0 +1,16 @@
+#pragma once
+
+#include <set>
+#include <string>
+
+/// The list of the versions that `back` has left, and that `publish` refuses.
+inline constexpr const char* withdrawn_list = "/var/db/timezone/withdrawn";
+
+using version_set = std::set<std::string>;
+
+/// The versions in the list, one a line; none where there is no list.
+[[nodiscard]] version_set read_withdrawn();
+
+/// Replaces the list in one step, on the disk as well when this returns. Where the set is empty,
+/// there is no list afterwards. Throws std::system_error; the old list stays then.
+void write_withdrawn(const version_set& versions);

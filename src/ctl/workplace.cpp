@@ -1,0 +1,100 @@
+#include "ctl/workplace.h"
+
+#include <fcntl.h>
+#include <grp.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <filesystem>
+#include <system_error>
+
+#include "ctl/print.h"
+#include "fs/operations.h"
+#include "paths.h"
+
+namespace {
+
+bool try_lock(int directory) {
+  const bool locked = ::flock(directory, LOCK_EX | LOCK_NB) == 0;
+  check(locked || errno == EWOULDBLOCK, paths::downloads);
+  return locked;
+}
+
+}  // namespace
+
+void check(bool done, const char* path) {
+  if (!done) throw std::system_error(errno, std::generic_category(), path);
+}
+
+void become_storage_owner() {
+  struct stat storage {};
+  if (::geteuid() != 0 || ::stat(paths::storage, &storage) != 0) return;
+  check(::setgroups(0, nullptr) == 0 && ::setegid(storage.st_gid) == 0 &&
+            ::seteuid(storage.st_uid) == 0,
+        paths::storage);
+}
+
+faults faults_of_storage() {
+  const bool is_root = ::getuid() == 0;
+  faults found;
+  for (const std::string path : {paths::storage, paths::downloads}) {
+    struct stat directory {};
+    const bool is_there = ::stat(path.c_str(), &directory) == 0;
+    if (!is_there || ::faccessat(AT_FDCWD, path.c_str(), W_OK | X_OK, AT_EACCESS) != 0) {
+      found.push_back({path + " cannot be changed", std::strerror(errno)});
+    } else if (is_root && directory.st_uid != ::geteuid()) {
+      found.push_back({path + " has another owner than " + paths::storage, "chown it"});
+    } else if (is_root && (directory.st_mode & (S_IWGRP | S_IWOTH)) != 0) {
+      found.push_back({"others than its owner can write " + path, "chmod go-w it"});
+    }
+  }
+  return found;
+}
+
+storage_lock::storage_lock()
+    : directory(::open(paths::downloads, O_RDONLY | O_DIRECTORY | O_CLOEXEC)),
+      held((check(directory.is_open(), paths::downloads), try_lock(directory.get()))) {}
+
+workshop::workshop() {
+  check(::mkdir(workshop_path, S_IRWXU) == 0, workshop_path);
+}
+
+workshop::~workshop() {
+  std::error_code ignored;
+  std::filesystem::remove_all(workshop_path, ignored);
+}
+
+std::string workshop::path_of(const std::string& name) const {
+  return std::string(workshop_path) + "/" + name;
+}
+
+void clear_leftovers() {
+  remove_and_say(workshop_path);
+  fs::unstage_symlink(new_latest_link);
+  static_cast<void>(::unlink(new_withdrawn_list));
+}
+
+void remove_and_say(const std::string& path) {
+  if (std::filesystem::remove_all(path) > 0) say("removed " + path);
+}
+
+void replace_link(const std::string& target, const char* link, const char* staged) {
+  if (fs::replace_symlink(target.c_str(), link, staged)) return;
+  fs::remove(link);
+  fs::create_symlink(target.c_str(), link);
+}
+
+bool is_one_file_system() {
+  struct stat storage {};
+  struct stat downloads {};
+  return ::stat(paths::storage, &storage) == 0 && ::stat(paths::downloads, &downloads) == 0 &&
+         storage.st_dev == downloads.st_dev;
+}
+
+void sync_file_system(const char* directory) {
+  const fs::descriptor opened(::open(directory, O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  check(opened.is_open() && ::syncfs(opened.get()) == 0, directory);
+}

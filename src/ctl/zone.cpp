@@ -1,0 +1,23 @@
+#include "ctl/commands.h"
+#include "ctl/completeness.h"
+#include "ctl/device.h"
+#include "ctl/files.h"
+#include "ctl/print.h"
+#include "ctl/workplace.h"
+#include "paths.h"
+
+outcome set_zone(const std::string& name) {
+  const device now = read_device();
+  const std::string localtime = paths::localtime_link;
+  if (!now.view.current_path || !has_zone(*now.view.current_path, name))
+    return refuse({outcome::unusable, {{name + " is no whole zone of the active copy"}}});
+  const std::string target = std::string(paths::zoneinfo_link) + "/" + name;
+  if (const std::string closed = closed_part(target); !closed.empty())
+    return refuse({outcome::unusable, {{"not everyone can read " + closed, "chmod a+rX it"}}});
+  if (is_there(localtime) && now.localtime_target.empty())
+    return refuse({outcome::failed, {{localtime + " is no link", "remove it"}}});
+  replace_link(target, paths::localtime_link, paths::new_localtime_link);
+  sync_file_system(paths::storage);
+  say("zone: " + name);
+  return outcome::done;
+}
