@@ -201,7 +201,7 @@ ADD = "kestrelctl publish 2026b.1.0 /tmp/fetched"
     ("ln -sfn $PWD/tz/x tz_latest", "names x, which is no version: remove", "rm tz_latest"),
     ("ln -sfn $PWD/tz/2026c tz_latest", "/tz/2026c, the newest download, is missing", "rm tz_latest"),
     ("mkdir -p tz/2026c/icutz; : >tz/2026c/icutz/icutz44b.dat; ln -sfn $PWD/tz/2026c tz_latest",
-     "2026c has schema 44b, and /usr/share/icu/icutzformat.txt says 44l: remove", "rm tz_latest"),
+     "2026c has schema 44b, and the system copy has 44l: remove", "rm tz_latest"),
     ("rm localtime", "localtime is missing: kestrelctl zone NAME", "kestrelctl zone Asia/Tokyo"),
     ("rm localtime; mkdir localtime", "localtime is no link: remove it, and kestrelctl zone NAME",
      "rmdir localtime; kestrelctl zone Asia/Tokyo"),
@@ -272,13 +272,6 @@ def test_publishing_in_place():
 CHANGING = r"(mkdir|symlink|rename|unlink|syncfs|fsync|fchmod)|openat.*O_CREAT|write\(\d+, \"\w"
 
 
-def prepare_for_interruption():
-    device.__wrapped__()
-    publish("2026b", "2026c")
-    shutil.copytree(STORAGE / "tz/2026b.1.0", STORAGE / "tz/2025z.1.0")
-    fetch("2026d")
-
-
 def lasting():
     return {(path, what) for path, what in kinds()
             if ".kestrelctl" not in path and "withdrawn" not in path}
@@ -286,17 +279,21 @@ def lasting():
 
 @pytest.mark.parametrize("line", ["publish 2026d.1.0 DIR", "back 2026b.1.0", "prune", "zone Etc/UTC"])
 def test_interrupted(line):
-    prepare_for_interruption()
+    publish("2026b", "2026c")
+    sh("cp -r tz/2026b.1.0 tz/2025z.1.0; rm -rf /tmp/db; cp -a /var/db /tmp/db")
+    fetch("2026d")
     assert ctl(line, *TRACER)[1] == 0
-    undisturbed, seen = lasting(), Counter()
+    undisturbed, seen, kinds_seen = lasting(), Counter(), Counter()
     for call in TRACE.read_text().splitlines():
-        name = call.split("(")[0]
+        name, kind = call.split("(")[0], re.sub(r"\d+|\"[\w+.]*\"", "", call)
         seen[name] += 1
-        if not re.match(CHANGING, call):
+        kinds_seen[kind] += 1
+        # Of calls that differ in a descriptor or a name only, two are enough.
+        if not re.match(CHANGING, call) or kinds_seen[kind] > 2:
             continue
         for fault in (f"signal=KILL:when={seen[name]}", f"error=ENOSPC:when={seen[name]}+",
                       f"error=EIO:when={seen[name]}"):
-            prepare_for_interruption()
+            sh("rm -rf /var/db/*; cp -a /tmp/db/. /var/db")
             said = ctl(line, *TRACER, "-e", f"inject={name}:{fault}")
             assert (STORAGE / "localtime").read_bytes().startswith(b"TZif"), (call, fault)
             assert said[1] or lasting() == undisturbed, (call, fault, said)
@@ -310,8 +307,8 @@ def test_interrupted(line):
 @pytest.mark.parametrize("line, said", [
     ("back", "2026a.1.0 is active"), ("back 2026b.1.0", "2026b.1.0 is active"),
     ("prune", "removed /var/db/timezone/tz/2025z.1.0"), ("zone Etc/UTC", "zone: Etc/UTC")])
-@pytest.mark.parametrize("limit", ["nr_inodes=$(df --output=iused /var | tail -n 1)",
-                                   "size=$(df -B1 --output=used /var | tail -n 1)"])
+@pytest.mark.parametrize("limit", ["nr_inodes=$(($(df --output=iused /var | tail -n 1)))",
+                                   "size=$(($(df -B1 --output=used /var | tail -n 1)))"])
 def test_full_storage(line, said, limit):
     publish("2026b", "2026c")
     shutil.copytree(STORAGE / "tz/2026b.1.0", STORAGE / "tz/2025z.1.0")

@@ -31,10 +31,12 @@ void withdraw(const device& now, const version_set& withdrawn) {
   try {
     write_withdrawn(withdrawn);
   } catch (const std::system_error& failure) {
-    for (const std::string& version : withdrawn)
-      if (!now.withdrawn.contains(version))
-        complain(
-            {version + " is not withdrawn, and a downloader may publish it again", failure.what()});
+    for (const std::string& version : withdrawn) {
+      if (!now.withdrawn.contains(version)) {
+        complain(fault("%s is not withdrawn, and a downloader may publish it again", {version},
+                       failure.what()));
+      }
+    }
   }
 }
 
@@ -63,7 +65,7 @@ outcome go_back(const std::string& version) {
     say(name + " is active");
     return outcome::done;
   }
-  complain({name + " is not active", "see the next lines"});
+  complain(fault("%s is not active", {name}, "see the next lines"));
   complain_all(faults_of(then));
   return outcome::failed;
 }

@@ -18,18 +18,14 @@ using std::filesystem::directory_entry;
 
 /// A copy on the way to its faults.
 struct inspection {
-  std::filesystem::path top;   // the directory of the download; for the system copy, its tree
-  std::filesystem::path tree;  // the zoneinfo tree, relative to `top`
-  std::string shown;           // how the lines call `top`
-  std::string schema;          // the system copy's
+  std::filesystem::path top;    // the directory of the download; for the system copy, its tree
+  std::filesystem::path tree;   // the zoneinfo tree, relative to `top`
+  std::filesystem::path shown;  // how the lines call `top`
+  std::string schema;           // the system copy's
   faults found = {};
 
-  void add(const std::filesystem::path& inside, const std::string& what) {
-    found.push_back({(shown / inside).string() + " " + what});
-  }
-  void add_closed(const std::filesystem::path& inside, bool is_directory) {
-    found.push_back({"not everyone can read " + (shown / inside).string(),
-                     std::string("chmod ") + (is_directory ? "755" : "644") + " it"});
+  [[nodiscard]] std::string name_of(const std::filesystem::path& inside) const {
+    return shown / inside;
   }
 };
 
@@ -52,6 +48,10 @@ bool is_open_to_all(const std::filesystem::file_status& status) {
   return (status.permissions() & needed) == needed;
 }
 
+fault closed_to_some(const std::string& path, bool is_directory) {
+  return fault("not everyone can read %s", {path}, is_directory ? "chmod 755 it" : "chmod 644 it");
+}
+
 bool is_zone_or_text(const std::string& content, const std::filesystem::path& twin) {
   if (content.starts_with("TZif")) return is_whole_zone(content);
   const bool is_text = !content.empty() && content.find('\0') == std::string::npos;
@@ -63,26 +63,28 @@ void inspect_link(inspection& copy, const std::filesystem::path& inside,
   const std::string target = link_target(copy.top / inside);
   const bool is_of_the_image = target.starts_with('/') && target == link_target(twin);
   if (!is_of_the_image && !resolve_inside(copy.top, inside))
-    copy.add(inside, "is a link that leads out of the copy or nowhere");
+    copy.found.push_back(
+        fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
 }
 
 void inspect_tree(inspection& copy) {
   const std::filesystem::path system = paths::system_zoneinfo;
   std::error_code error;
   if (!std::filesystem::is_directory(copy.top / copy.tree, error))
-    copy.add(copy.tree, "is missing or no directory");
+    copy.found.push_back(fault("%s is missing or no directory", {copy.name_of(copy.tree)}));
   walk(copy.top, copy.tree, [&](const directory_entry& entry, const auto& inside) {
     const std::filesystem::path twin = system / inside.lexically_relative(copy.tree);
     const std::filesystem::file_status status = entry.symlink_status(error);
     if (is_symlink(status)) {
       inspect_link(copy, inside, twin);
     } else if (!is_directory(status) && !is_regular_file(status)) {
-      copy.add(inside, "is neither a file, nor a directory, nor a link");
+      copy.found.push_back(
+          fault("%s is neither a file, nor a directory, nor a link", {copy.name_of(inside)}));
     } else if (!is_open_to_all(status)) {
-      copy.add_closed(inside, is_directory(status));
+      copy.found.push_back(closed_to_some(copy.name_of(inside), is_directory(status)));
     } else if (is_regular_file(status) &&
                !is_zone_or_text(read_file(entry.path()).value_or(""), twin)) {
-      copy.add(inside, "is not whole");
+      copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
     }
     return true;
   });
@@ -100,7 +102,7 @@ void inspect_missing(inspection& copy) {
     if (std::filesystem::exists(ours, error) &&
         std::filesystem::is_directory(ours, error) == is_directory)
       return true;
-    copy.add(copy.tree / name, "is missing");
+    copy.found.push_back(fault("%s is missing", {copy.name_of(copy.tree / name)}));
     return false;
   });
 }
@@ -110,7 +112,9 @@ void inspect_release(inspection& copy, const std::string& version) {
   constexpr std::string_view head = "# version ";
   const std::string release = release_of(version);
   const auto compare = [&](const char* name, const std::string& found) {
-    if (found != release) copy.add(copy.tree / name, "is of release " + found + ", not " + release);
+    if (found != release)
+      copy.found.push_back(
+          fault("%s is of release %s, not %s", {copy.name_of(copy.tree / name), found, release}));
   };
   const std::filesystem::path tree = copy.top / copy.tree;
   const std::string word = fs::read_first_word((tree / "+VERSION").c_str());
@@ -123,9 +127,10 @@ void inspect_schema(inspection& copy) {
   const std::string declared = vela_icu(copy.top).get_schema();
   const std::string file = "icutz" + copy.schema + ".dat";
   if (declared.empty()) {
-    copy.add("icutz/" + file, "is missing");
+    copy.found.push_back(fault("%s is missing", {copy.name_of("icutz/" + file)}));
   } else if (declared != copy.schema) {
-    copy.add("icutz", "has schema " + declared + ", and the system copy has " + copy.schema);
+    copy.found.push_back(fault("%s has schema %s, and the system copy has %s",
+                               {copy.name_of("icutz"), declared, copy.schema}));
   }
 }
 
@@ -136,9 +141,10 @@ void inspect_bundles(inspection& copy) {
     const std::filesystem::file_status status = entry.symlink_status(error);
     if (is_symlink(status)) {
       if (!resolve_inside(copy.top, inside))
-        copy.add(inside, "is a link that leads out of the copy or nowhere");
+        copy.found.push_back(
+            fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
     } else if (!is_open_to_all(status)) {
-      copy.add_closed(inside, is_directory(status));
+      copy.found.push_back(closed_to_some(copy.name_of(inside), is_directory(status)));
       is_closed = true;
     }
     return false;
@@ -148,11 +154,12 @@ void inspect_bundles(inspection& copy) {
     const std::filesystem::path inside = "icutz/" + name + ".res";
     const std::optional<std::string> content = read_file(copy.top / inside);
     if (!content) {
-      copy.add(inside, "is missing");
+      copy.found.push_back(fault("%s is missing", {copy.name_of(inside)}));
     } else if (!is_whole_bundle(*content)) {
-      copy.add(inside, "is not whole");
+      copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
     } else if (!copy.schema.empty() && !has_byte_order_of(copy.schema, *content)) {
-      copy.add(inside, "has not the byte order of schema " + copy.schema);
+      copy.found.push_back(
+          fault("%s has not the byte order of schema %s", {copy.name_of(inside), copy.schema}));
     }
   }
 }

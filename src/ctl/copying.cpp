@@ -30,6 +30,7 @@ constexpr int file_flags = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
 struct place {
   int directory;
   std::string path;
+  int levels_left = 64;  // so that no directory is too deep for the stack
 
   [[nodiscard]] std::string path_of(const std::string& name) const { return path + "/" + name; }
 };
@@ -47,15 +48,16 @@ std::vector<std::string> names_in(const place& from) {
   return names;
 }
 
-/// What makes a directory one in which others can exchange entries.
+/// Why what is in a directory is not to be copied: others can exchange it meanwhile, for example.
 faults faults_of_directory(const place& from) {
   struct stat found {};
   check(::fstat(from.directory, &found) == 0, from.path.c_str());
   const uid_t owner = found.st_uid;
   if (owner != 0 && owner != ::getuid() && owner != ::geteuid())
-    return {{from.path + " belongs to another user", "chown -R it"}};
+    return {fault("%s belongs to another user", {from.path}, "chown -R it")};
+  if (from.levels_left == 0) return {fault("%s lies too deep", {from.path})};
   if ((found.st_mode & (S_IWGRP | S_IWOTH)) != 0)
-    return {{"others than its owner can write " + from.path, "chmod -R go-w it"}};
+    return {fault("others than its owner can write %s", {from.path}, "chmod -R go-w it")};
   return {};
 }
 
@@ -111,7 +113,7 @@ faults copy_entry(const place& from, const place& to, const std::string& name) {
       copy_link(from, to, name);
       return {};
     default:
-      return {{from.path_of(name) + " is neither a file, nor a directory, nor a link"}};
+      return {fault("%s is neither a file, nor a directory, nor a link", {from.path_of(name)})};
   }
 }
 
@@ -126,11 +128,12 @@ faults copy_directory(const place& from, const place& to, const std::string& nam
   check(::mkdirat(to.directory, name.c_str(), S_IRWXU) == 0, path.c_str());
   const fs::descriptor copy(::openat(to.directory, name.c_str(), directory_flags));
   check(copy.is_open(), path.c_str());
-  const place below{source.get(), from.path_of(name)};
+  const place below{source.get(), from.path_of(name), from.levels_left - 1};
   faults found = faults_of_directory(below);
-  if (found.empty())
+  if (found.empty()) {
     for (const std::string& entry : names_in(below))
       append(found, copy_entry(below, {copy.get(), path}, entry));
+  }
   check(::fchmod(copy.get(), directory_mode) == 0, path.c_str());
   return found;
 }
@@ -138,6 +141,7 @@ faults copy_directory(const place& from, const place& to, const std::string& nam
 faults set_modes_below(const place& from) {
   check(::fchmod(from.directory, directory_mode) == 0, from.path.c_str());
   faults found = faults_of_directory(from);
+  if (!found.empty()) return found;
   for (const std::string& name : names_in(from)) {
     const mode_t kind = kind_of(from, name);
     if (kind != S_IFDIR && kind != S_IFREG) continue;
@@ -147,7 +151,7 @@ faults set_modes_below(const place& from) {
     if (kind == S_IFREG) {
       check(::fchmod(entry.get(), file_mode) == 0, from.path_of(name).c_str());
     } else {
-      append(found, set_modes_below({entry.get(), from.path_of(name)}));
+      append(found, set_modes_below({entry.get(), from.path_of(name), from.levels_left - 1}));
     }
   }
   return found;
@@ -183,12 +187,13 @@ faults copy_download(const std::string& from, const std::string& to) {
   const place download{source.get(), from};
   faults found = faults_of_directory(download);
   if (!found.empty()) return found;
-  for (const std::string name : {"zoneinfo", "icutz"})
+  for (const std::string name : {"zoneinfo", "icutz"}) {
     if (kind_of(download, name) == S_IFDIR) {
       append(found, copy_directory(download, {copy.get(), to}, name));
     } else {
-      found.push_back({download.path_of(name) + " is missing or no directory"});
+      found.push_back(fault("%s is missing or no directory", {download.path_of(name)}));
     }
+  }
   return found;
 }
 
@@ -199,7 +204,6 @@ faults set_modes(const std::string& path) {
 }
 
 bool are_same(const std::string& one, const std::string& other) {
-  for (const std::string part : {"/zoneinfo", "/icutz"})
-    if (contents_of(one + part) != contents_of(other + part)) return false;
-  return true;
+  return contents_of(one + "/zoneinfo") == contents_of(other + "/zoneinfo") &&
+         contents_of(one + "/icutz") == contents_of(other + "/icutz");
 }

@@ -31,9 +31,10 @@ device read_device() {
   now.localtime_target = link_target(paths::localtime_link);
   now.system_version = fs::read_first_word(system_version_file) + ".1.0";
   now.active_version = "none";
-  if (now.view.current_path)
+  if (now.view.current_path) {
     now.active_version =
         now.view.current_path->empty() ? now.system_version : version_in(*now.view.current_path);
+  }
   now.latest_version = version_in(now.latest_target);
   now.system_schema = fs::read_first_word(schema_file);
   const std::string through = std::string(paths::zoneinfo_link) + "/";

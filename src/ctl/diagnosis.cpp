@@ -52,9 +52,10 @@ std::string way_back_to(const device& now) {
 std::vector<std::string> places_of_copies(const device& now) {
   std::vector<std::string> places = {paths::system_zoneinfo, paths::system_icu, paths::storage,
                                      paths::downloads};
-  for (const auto& path : {now.view.current_path, now.view.latest_path})
+  for (const auto& path : {now.view.current_path, now.view.latest_path}) {
     if (path && path->starts_with(paths::downloads))
       places.insert(places.end(), {*path, zoneinfo_directory(*path), icu_directory(*path)});
+  }
   return places;
 }
 
@@ -62,7 +63,7 @@ faults faults_of_places(const device& now) {
   faults found;
   for (const std::string& place : places_of_copies(now)) {
     const std::string closed = closed_part(place);
-    const fault one{"not everyone can read " + closed, "chmod a+rX it"};
+    const fault one("not everyone can read %s", {closed}, "chmod a+rX it");
     const auto is_same = [&one](const fault& other) { return other.what == one.what; };
     if (!closed.empty() && std::ranges::none_of(found, is_same)) found.push_back(one);
   }
@@ -74,18 +75,17 @@ faults faults_of_system(const device& now) {
   const std::string& schema = now.system_schema;
   faults found;
   if (!is_directory(paths::system_zoneinfo)) {
-    found.push_back({std::string(paths::system_zoneinfo) + " is missing", repair});
+    found.push_back(fault("%s is missing", {paths::system_zoneinfo}, repair));
   } else if (now.system_version == ".1.0") {
-    found.push_back(
-        {std::string(system_version_file) + " is missing, empty or unreadable", repair});
+    found.push_back(fault("%s is missing, empty or unreadable", {system_version_file}, repair));
   } else if (version_of(now.system_version) == vela_version()) {
     found.push_back(
-        {std::string(system_version_file) + " does not name a release such as 2026b", repair});
+        fault("%s does not name a release such as 2026b", {system_version_file}, repair));
   }
   if (schema.empty()) {
-    found.push_back({std::string(schema_file) + " is missing, empty or unreadable", repair});
+    found.push_back(fault("%s is missing, empty or unreadable", {schema_file}, repair));
   } else if (data_file_schema("icutz" + schema + ".dat") != schema) {
-    found.push_back({std::string(schema_file) + " does not name a schema such as 44l", repair});
+    found.push_back(fault("%s does not name a schema such as 44l", {schema_file}, repair));
   }
   return found;
 }
@@ -96,26 +96,28 @@ faults faults_of_fitness(const device& now, const std::string& path, const vela_
   if (!now.view.system || may_stay(copy, *now.view.system)) return {};
   const std::string file = path + "/icutz/icutz" + now.system_schema + ".dat";
   if (schema.empty() && is_there(file) && !closed_part(file).empty())
-    return {{"not everyone can read " + closed_part(file), "chmod a+rX it"}};
-  if (schema.empty()) return {{file + ", the schema's file, is missing"}};
-  if (schema != now.system_schema)
+    return {fault("not everyone can read %s", {closed_part(file)}, "chmod a+rX it")};
+  if (schema.empty()) return {fault("%s, the schema's file, is missing", {file})};
+  if (schema != now.system_schema) {
     return {
-        {path + " has schema " + schema + ", and " + schema_file + " says " + now.system_schema}};
-  return {{path + " is older than the system copy, " + now.system_version}};
+        fault("%s has schema %s, and the system copy has %s", {path, schema, now.system_schema})};
+  }
+  return {fault("%s is older than the system copy, %s", {path, now.system_version})};
 }
 
 faults faults_of_active_links(const device& now) {
   const std::string zoneinfo = paths::zoneinfo_link;
-  if (!is_there(zoneinfo)) return {{zoneinfo + " is missing", start}};
+  if (!is_there(zoneinfo)) return {fault("%s is missing", {zoneinfo}, start)};
   if (is_other_than_link(paths::zoneinfo_link)) return {};  // see faults_of_link_places
   if (!now.view.current_path)
-    return {{zoneinfo + " leads to " + now.zoneinfo_target + ", which is no copy", start}};
+    return {fault("%s leads to %s, which is no copy", {zoneinfo, now.zoneinfo_target}, start)};
   const std::string& path = *now.view.current_path;
-  if (now.zoneinfo_target != zoneinfo_directory(path))
-    return {{zoneinfo + " leads to " + now.zoneinfo_target + ", which no program expects",
-             way_back_to(now)}};
+  if (now.zoneinfo_target != zoneinfo_directory(path)) {
+    return {fault("%s leads to %s, which no program expects", {zoneinfo, now.zoneinfo_target},
+                  way_back_to(now))};
+  }
   if (!is_active(now, path) && !is_other_than_link(paths::icu_link))
-    return {{std::string(paths::icu_link) + " is not that of the active copy", way_back_to(now)}};
+    return {fault("%s is not that of the active copy", {paths::icu_link}, way_back_to(now))};
   return {};
 }
 
@@ -124,9 +126,9 @@ faults faults_of_active(const device& now) {
   const std::string& path = *now.view.current_path;
   faults found;
   if (!path.empty()) {
-    if (!is_directory(path)) return {{path + " is missing", start}};
+    if (!is_directory(path)) return {fault("%s is missing", {path}, start)};
     if (!now.view.current || version_of(now.active_version) == vela_version())
-      return {{path + " has a name that is no version", start}};
+      return {fault("%s has a name that is no version", {path}, start)};
     found = faults_of_fitness(now, path, *now.view.current);
     if (!found.empty()) return with_cure(found, start);
   }
@@ -140,13 +142,14 @@ faults faults_of_latest(const device& now) {
   const std::string latest = paths::latest_link;
   const std::string& target = now.latest_target;
   const std::string cure = "remove " + latest;
-  if (is_other_than_link(paths::latest_link)) return {{latest + " is no link", "remove it"}};
+  if (is_other_than_link(paths::latest_link))
+    return {fault("%s is no link", {latest}, "remove it")};
   if (target.empty() || target == now.view.current_path) return {};
   if (!target.starts_with(paths::downloads) || now.latest_version == target)
-    return {{latest + " leads to " + target + ", which is no path of a download", cure}};
+    return {fault("%s leads to %s, which is no path of a download", {latest, target}, cure)};
   if (version_of(now.latest_version) == vela_version())
-    return {{latest + " names " + now.latest_version + ", which is no version", cure}};
-  if (!is_directory(target)) return {{target + ", the newest download, is missing", cure}};
+    return {fault("%s names %s, which is no version", {latest, now.latest_version}, cure)};
+  if (!is_directory(target)) return {fault("%s, the newest download, is missing", {target}, cure)};
   faults found;
   if (now.view.latest && now.view.system && !now.view.latest->compatible_schema(*now.view.system))
     found = faults_of_fitness(now, target, *now.view.latest);
@@ -156,12 +159,13 @@ faults faults_of_latest(const device& now) {
 faults faults_of_next_run(const device& now) {
   using enum next_run::action;
   if (now.next.what == keeps) return {};
-  const std::string line = "the next run of kestrel ";
-  if (now.next.what != fails) return {{line + to_text(now.next), start}};
-  faults found = {{line + "fails", "see the other lines"}};
-  if (!now.view.can_change_storage)
-    found.push_back({std::string(paths::storage) + " is missing, read-only, or append-only",
-                     "make it a directory that can be changed"});
+  if (now.next.what != fails)
+    return {fault("the next run of kestrel %s", {to_text(now.next)}, start)};
+  faults found = {fault("the next run of kestrel %s", {"fails"}, "see the other lines")};
+  if (!now.view.can_change_storage) {
+    found.push_back(fault("%s is missing, read-only, or append-only", {paths::storage},
+                          "make it a directory that can be changed"));
+  }
   return found;
 }
 
@@ -170,29 +174,30 @@ faults faults_of_remains(const device& now) {
   const std::string path = now.view.current_path.value_or("");
   faults found;
   if (fs::is_symlink_to(icu_directory(path).c_str(), paths::new_icu_link))
-    found.push_back({std::string(paths::new_icu_link) + " is of a run that was killed", start});
+    found.push_back(fault("%s is of a run that was killed", {paths::new_icu_link}, start));
   if (fs::exists(paths::legacy_icu_link))
-    found.push_back({std::string(paths::legacy_icu_link) + " is of an older system", "remove it"});
+    found.push_back(fault("%s is of an older system", {paths::legacy_icu_link}, "remove it"));
   std::error_code error;
   if (is_there(paths::legacy_icu) &&
       (!is_directory(paths::legacy_icu) || std::filesystem::is_empty(paths::legacy_icu, error)))
-    found.push_back({std::string(paths::legacy_icu) + " is of an older system", "remove it"});
+    found.push_back(fault("%s is of an older system", {paths::legacy_icu}, "remove it"));
   return found;
 }
 
 faults faults_of_zone(const device& now) {
   const std::string localtime = paths::localtime_link;
   if (is_other_than_link(paths::localtime_link))
-    return {{localtime + " is no link", std::string("remove it, and ") + set_zone}};
-  if (now.localtime_target.empty()) return {{localtime + " is missing", set_zone}};
-  if (now.zone.empty())
-    return {{localtime + " leads to " + now.localtime_target + ", not into " + paths::zoneinfo_link,
-             set_zone}};
+    return {fault("%s is no link", {localtime}, std::string("remove it, and ") + set_zone)};
+  if (now.localtime_target.empty()) return {fault("%s is missing", {localtime}, set_zone)};
+  if (now.zone.empty()) {
+    return {fault("%s leads to %s, not into %s",
+                  {localtime, now.localtime_target, paths::zoneinfo_link}, set_zone)};
+  }
   if (!now.view.current_path || has_zone(*now.view.current_path, now.zone)) return {};
   const std::string file = zoneinfo_directory(*now.view.current_path) + "/" + now.zone;
   std::error_code error;
   if (std::filesystem::is_regular_file(file, error)) return {};  // see faults_of_active
-  return {{"the local zone " + now.zone + " is not in the active copy", set_zone}};
+  return {fault("the local zone %s is not in the active copy", {now.zone}, set_zone)};
 }
 
 /// Programs find the links by these, which the image sets.
@@ -200,7 +205,7 @@ faults faults_of_entrance(const std::string& entrance, const std::string& link) 
   const std::filesystem::path target =
       std::filesystem::path(entrance).parent_path() / link_target(entrance);
   if (target.lexically_normal() == link) return {};
-  return {{entrance + " does not lead to " + link, "ln -sfn " + link + " " + entrance}};
+  return {fault("%s does not lead to %s", {entrance, link}, "ln -sfn " + link + " " + entrance)};
 }
 
 }  // namespace
@@ -230,24 +235,24 @@ faults faults_of_link_places(const device& now) {
   const std::string icutz = paths::icu_link;
   faults found;
   if (is_other_than_link(paths::zoneinfo_link))
-    found.push_back({zoneinfo + " is no link", std::string("remove it, and ") + start});
+    found.push_back(fault("%s is no link", {zoneinfo}, std::string("remove it, and ") + start));
   if (is_other_than_link(paths::icu_link))
-    found.push_back({icutz + " is no link", "remove it, and " + way_back_to(now)});
+    found.push_back(fault("%s is no link", {icutz}, "remove it, and " + way_back_to(now)));
   return found;
 }
 
 faults faults_of_way_back(const device& now, const std::string& version) {
   const std::string path = version.empty() ? "" : path_of(version);
   if (!now.view.system)
-    return {{std::string(system_version_file) + " does not name a release", repair}};
+    return {fault("%s does not name a release such as 2026b", {system_version_file}, repair)};
   faults found;
   if (!path.empty()) {
-    if (!is_directory(path)) return {{path + " is missing"}};
+    if (!is_directory(path)) return {fault("%s is missing", {path})};
     found = faults_of_fitness(now, path, vela_dataset(path));
     if (found.empty()) found = faults_of_copy(path, version, path);
   }
   if (found.empty() && !now.zone.empty() && !has_zone(path, now.zone))
-    found.push_back({zoneinfo_directory(path) + " has not the local zone, " + now.zone});
+    found.push_back(fault("%s has not the local zone, %s", {zoneinfo_directory(path), now.zone}));
   static_cast<void>(take_reports());
   return found;
 }

@@ -1,14 +1,25 @@
 #pragma once
 
+#include <initializer_list>
+#include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 /// Something that is wrong.
 struct fault {
-  std::string what;       // begins with the thing at fault, mostly a path
-  std::string cure = {};  // what to do about it; empty where `what` says enough
+  /// What `filled` makes of the format and the texts, and what to do about it; no cure where the
+  /// format says enough. Each format has its entry in the manual.
+  explicit fault(std::string_view format, std::initializer_list<std::string> texts = {},
+                 std::string what_to_do = {});
+
+  std::string what;
+  std::string cure;
 };
 using faults = std::vector<fault>;
+
+/// `format` with each "%s" replaced by the next of `texts`.
+[[nodiscard]] std::string filled(std::string_view format, std::span<const std::string> texts);
 
 /// How a command ends: its exit status.
 enum class outcome {

@@ -56,19 +56,21 @@ outcome change(const command& chosen, const words& arguments) {
   if (const faults found = faults_of_storage(); !found.empty())
     return refuse({outcome::failed, found});
   const storage_lock lock;
-  if (!lock.is_held())
-    return refuse(
-        {outcome::not_now, {{"another kestrelctl is at work", "start again when it has ended"}}});
+  if (!lock.is_held()) {
+    return refuse({outcome::not_now,
+                   {fault("another kestrelctl is at work", {}, "start again when it has ended")}});
+  }
   clear_leftovers();
   return chosen.run(arguments);
 }
 
 outcome run(const command& chosen, const words& arguments) {
   if (arguments.size() < chosen.least || arguments.size() > chosen.most)
-    return refuse({outcome::wrong_usage, {{usage()}}});
-  if (chosen.takes_version && !arguments.empty() && version_of(arguments[0]) == vela_version())
+    return refuse({outcome::wrong_usage, {fault(usage())}});
+  if (chosen.takes_version && !arguments.empty() && version_of(arguments[0]) == vela_version()) {
     return refuse({outcome::wrong_usage,
-                   {{arguments[0] + " is no version", "a version is such as 2026b.1.0"}}});
+                   {fault("%s is no version", {arguments[0]}, "a version is such as 2026b.1.0")}});
+  }
   if (chosen.changes_storage) return change(chosen, arguments);
   become_storage_owner();
   return chosen.run(arguments);
@@ -83,7 +85,7 @@ outcome run(const words& line) {
   } else if (line == words{"--help"}) {
     say(usage());
   } else {
-    return refuse({outcome::wrong_usage, {{usage()}}});
+    return refuse({outcome::wrong_usage, {fault(usage())}});
   }
   return outcome::done;
 }
@@ -91,7 +93,7 @@ outcome run(const words& line) {
 /// What a system call that failed with this number leads to.
 outcome status_of(int error) {
   if (error != ENOSPC && error != EDQUOT) return outcome::failed;
-  complain({"there is no room", "kestrelctl prune makes some"});
+  complain(fault("there is no room", {}, "kestrelctl prune makes some"));
   return outcome::not_now;
 }
 
@@ -99,10 +101,10 @@ outcome run_or_explain(const words& line) {
   try {
     return run(line);
   } catch (const std::system_error& failure) {
-    complain({failure.what()});
+    complain(fault(failure.what()));
     return status_of(failure.code().value());
   } catch (const std::exception& failure) {
-    complain({failure.what()});
+    complain(fault(failure.what()));
   } catch (int error) {
     complain_all(take_reports());
     return status_of(error);
@@ -116,6 +118,6 @@ int main(int count, char** arguments) {
   ::umask(S_IWGRP | S_IWOTH);  // what is made is for everyone to read
   const outcome end = run_or_explain({arguments + 1, arguments + count});
   if (std::cout.flush()) return static_cast<int>(end);
-  complain({"standard output cannot be written"});
+  complain(fault("standard output cannot be written"));
   return static_cast<int>(outcome::failed);
 }

@@ -27,7 +27,8 @@ void complain_all(const faults& all) {
   constexpr std::size_t limit = 20;
   const std::size_t shown = std::min(all.size(), limit);
   for (std::size_t i = 0; i < shown; ++i) complain(all[i]);
-  if (shown < all.size()) complain({std::to_string(all.size() - shown) + " more lines like these"});
+  if (shown < all.size())
+    complain(fault("%s more lines like these", {std::to_string(all.size() - shown)}));
 }
 
 outcome refuse(const refusal& why) {

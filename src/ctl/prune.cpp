@@ -20,17 +20,19 @@ void add_linked(std::set<std::string>& names, const std::filesystem::path& link)
   const std::filesystem::path downloads = paths::downloads;
   const std::filesystem::path target = link.parent_path() / link_target(link);
   std::error_code error;
-  for (const auto& way : {target.lexically_normal(), std::filesystem::canonical(target, error)})
+  for (const auto& way : {target.lexically_normal(), std::filesystem::canonical(target, error)}) {
     if (const auto inside = way.lexically_relative(downloads); !inside.empty())
       names.insert(*inside.begin());
+  }
 }
 
 /// The names in tz/ that a link in the storage or in tz/ leads to.
 std::set<std::string> linked_names() {
   std::set<std::string> names;
-  for (const char* const directory : {paths::storage, paths::downloads})
+  for (const char* const directory : {paths::storage, paths::downloads}) {
     for (const auto& entry : directory_iterator(directory))
       if (entry.is_symlink()) add_linked(names, entry.path());
+  }
   return names;
 }
 
@@ -61,7 +63,7 @@ outcome prune() {
     try {
       remove_and_say(path_of(version));
     } catch (const std::system_error& failure) {
-      complain({path_of(version) + " cannot be removed", failure.code().message()});
+      complain(fault("%s cannot be removed", {path_of(version)}, failure.code().message()));
       end = outcome::failed;
     }
   }

@@ -43,12 +43,13 @@ refusal judge_version(const device& now, const candidate& wanted) {
   using enum outcome;
   const vela_version version = version_of(wanted.version);
   if (now.withdrawn.contains(wanted.version))
-    return {nothing_to_do, {{wanted.version + " is withdrawn", "publish a higher version"}}};
+    return {nothing_to_do,
+            {fault("%s is withdrawn", {wanted.version}, "publish a higher version")}};
   const auto is_in_the_way = [&](const std::string& rival, const std::string& path) {
     return path != wanted.path && !(version > version_of(rival));
   };
   const auto refuse_for = [&](const std::string& rival, const char* what) -> refusal {
-    return {nothing_to_do, {{wanted.version + " is not newer than " + what + ", " + rival}}};
+    return {nothing_to_do, {fault("%s is not newer than %s, %s", {wanted.version, what, rival})}};
   };
   if (is_in_the_way(now.system_version, ""))
     return refuse_for(now.system_version, "the system copy");
@@ -66,19 +67,20 @@ refusal judge_version(const device& now, const candidate& wanted) {
 faults faults_of_download(const device& now, const std::string& path, const candidate& wanted) {
   faults found = faults_of_copy(path, wanted.version, wanted.directory);
   if (!now.zone.empty() && !has_zone(path, now.zone))
-    found.push_back({wanted.directory + "/zoneinfo has not the local zone, " + now.zone});
+    found.push_back(
+        fault("%s has not the local zone, %s", {wanted.directory + "/zoneinfo", now.zone}));
   return found;
 }
 
 /// Gives the download its name in one step; where a damaged one has it, the two change places.
-refusal name_download(const std::string& made, const std::string& path) {
+refusal name_download(const std::string& path) {
   if (!is_there(path)) {
-    check(::rename(made.c_str(), path.c_str()) == 0, path.c_str());
-  } else if (::renameat2(AT_FDCWD, made.c_str(), AT_FDCWD, path.c_str(), RENAME_EXCHANGE) != 0) {
+    check(::rename(new_download, path.c_str()) == 0, path.c_str());
+  } else if (::renameat2(AT_FDCWD, new_download, AT_FDCWD, path.c_str(), RENAME_EXCHANGE) != 0) {
     check(errno == EINVAL || errno == ENOSYS, path.c_str());
     return {outcome::failed,
-            {{path + " is damaged, and this file system cannot replace it in one step",
-              "kestrelctl back, remove it, and publish again"}}};
+            {fault("%s is damaged, and this file system cannot replace it in one step", {path},
+                   "kestrelctl back, remove it, and publish again")}};
   }
   return {outcome::done, {}};
 }
@@ -86,20 +88,19 @@ refusal name_download(const std::string& made, const std::string& path) {
 /// Copies the download to a place of its own, checks the copy there, writes it to the disk, and
 /// only then gives it its name.
 refusal add_download(const device& now, const candidate& wanted) {
-  const workshop place;
-  const std::string made = place.path_of("download");
-  faults found = copy_download(wanted.directory, made);
-  if (found.empty()) found = faults_of_download(now, made, wanted);
+  const workshop made;
+  faults found = copy_download(wanted.directory, new_download);
+  if (found.empty()) found = faults_of_download(now, new_download, wanted);
   if (!found.empty()) return {outcome::unusable, found};
   sync_file_system(paths::downloads);
-  return name_download(made, wanted.path);
+  return name_download(wanted.path);
 }
 
 /// Sees to it that the download is at its path, whole: it is there already, or it is copied there.
 refusal place_download(const device& now, const candidate& wanted) {
   std::error_code error;
   if (!std::filesystem::is_directory(wanted.directory, error))
-    return {outcome::unusable, {{wanted.directory + " is missing or no directory"}}};
+    return {outcome::unusable, {fault("%s is missing or no directory", {wanted.directory})}};
   if (is_same_directory(wanted.directory, wanted.path)) {
     faults found = set_modes(wanted.path);
     if (found.empty()) found = faults_of_download(now, wanted.path, wanted);
@@ -108,7 +109,7 @@ refusal place_download(const device& now, const candidate& wanted) {
     return add_download(now, wanted);
   } else if (!are_same(wanted.directory, wanted.path)) {
     return {outcome::unusable,
-            {{wanted.path + " has other content", "publish this under a higher version"}}};
+            {fault("%s has other content", {wanted.path}, "publish this under a higher version")}};
   }
   return {outcome::done, {}};
 }
@@ -136,7 +137,7 @@ void run_kestrel() {
     ::execlp(beside.c_str(), "kestrel", nullptr);
   }
   if (run == 0) {
-    complain({"kestrel is neither beside kestrelctl nor in the PATH", "install it"});
+    complain(fault("kestrel is neither beside kestrelctl nor in the PATH", {}, "install it"));
     ::_exit(1);
   }
   ::waitpid(run, nullptr, 0);
@@ -153,7 +154,7 @@ outcome activate(const candidate& wanted) {
     say(wanted.version + " is active");
     return outcome::done;
   }
-  complain({wanted.version + " is not active", "see the next lines"});
+  complain(fault("%s is not active", {wanted.version}, "see the next lines"));
   complain_all(faults_of(now));
   return outcome::failed;
 }

@@ -25,13 +25,9 @@ namespace fs {
 void report(int error, std::string_view format, std::initializer_list<const char*> texts) noexcept {
   const int saved_errno = errno;
   try {
-    std::string line;
-    for (const char* const text : texts) {
-      const std::size_t place = format.find("%s");
-      line.append(format.substr(0, place)).append(text);
-      format.remove_prefix(place + 2);
-    }
-    kept().push_back({line.append(format), std::strerror(error)});
+    const std::vector<std::string> copies(texts.begin(), texts.end());
+    kept().emplace_back(filled(format, copies), std::initializer_list<std::string>{},
+                        std::strerror(error));
   } catch (const std::bad_alloc&) {
     // The exception that follows the line says that something failed.
   }

@@ -44,11 +44,11 @@ faults faults_of_storage() {
     struct stat directory {};
     const bool is_there = ::stat(path.c_str(), &directory) == 0;
     if (!is_there || ::faccessat(AT_FDCWD, path.c_str(), W_OK | X_OK, AT_EACCESS) != 0) {
-      found.push_back({path + " cannot be changed", std::strerror(errno)});
+      found.push_back(fault("%s cannot be changed", {path}, std::strerror(errno)));
     } else if (is_root && directory.st_uid != ::geteuid()) {
-      found.push_back({path + " has another owner than " + paths::storage, "chown it"});
+      found.push_back(fault("%s has another owner than %s", {path, paths::storage}, "chown it"));
     } else if (is_root && (directory.st_mode & (S_IWGRP | S_IWOTH)) != 0) {
-      found.push_back({"others than its owner can write " + path, "chmod go-w it"});
+      found.push_back(fault("others than its owner can write %s", {path}, "chmod go-w it"));
     }
   }
   return found;
@@ -65,10 +65,6 @@ workshop::workshop() {
 workshop::~workshop() {
   std::error_code ignored;
   std::filesystem::remove_all(workshop_path, ignored);
-}
-
-std::string workshop::path_of(const std::string& name) const {
-  return std::string(workshop_path) + "/" + name;
 }
 
 void clear_leftovers() {

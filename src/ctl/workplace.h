@@ -9,6 +9,7 @@
 
 /// Where `publish` makes a download. Below tz/, so that one rename gives it its name.
 inline constexpr const char* workshop_path = "/var/db/timezone/tz/.kestrelctl";
+inline constexpr const char* new_download = "/var/db/timezone/tz/.kestrelctl/download";
 
 /// The names under which a new tz_latest and a new list of withdrawn versions are made.
 inline constexpr const char* new_latest_link = "/var/db/timezone/tz_latest.new";
@@ -52,9 +53,6 @@ class workshop final {
 
   workshop(const workshop&) = delete;
   workshop& operator=(const workshop&) = delete;
-
-  /// The path of the entry `name` in it.
-  [[nodiscard]] std::string path_of(const std::string& name) const;
 };
 
 /// Removes what a killed command left, so that a full disk has that room again. Prints each path on
