@@ -20,6 +20,9 @@ ENTRY = re.compile(r"(-?)(.+?)(?:([>=%])(.*)|([/|]))?")
 MODES = {">": 0o777, "=": 0o666, "/": 0o777, "|": 0o666}
 KESTREL = os.path.abspath(os.environ.get("KESTREL", "build/dev/kestrel"))
 os.environ["PATH"] = os.path.dirname(KESTREL) + ":" + os.environ["PATH"]
+# For tests of what several users do.
+several_users = pytest.mark.skipif(Path("/proc/self/uid_map").read_text().split()[2] == "1",
+                                   reason="takes several users: run it as root")
 
 
 # The scenes by name, each with the lines of each sign.
