@@ -199,7 +199,7 @@ ADD = "kestrelctl publish 2026b.1.0 /tmp/fetched"
     ("ln -sfn tz/2026b.1.0 tz_latest", "leads to tz/2026b.1.0, which is no path of a download: "
      "remove /var/db/timezone/tz_latest", "rm tz_latest"),
     ("ln -sfn $PWD/tz/x tz_latest", "names x, which is no version: remove", "rm tz_latest"),
-    ("ln -sfn $PWD/tz/2026c tz_latest", "2026c, the newest download, is missing: rem", "rm tz_latest"),
+    ("ln -sfn $PWD/tz/2026c tz_latest", "2026c, the newest download, is missing", "rm tz_latest"),
     ("mkdir -p tz/2026c/icutz; : >tz/2026c/icutz/icutz44b.dat; ln -sfn $PWD/tz/2026c tz_latest",
      "2026c has schema 44b, and the system copy has 44l: remove", "rm tz_latest"),
     ("rm localtime", "localtime is missing: kestrelctl zone NAME", "kestrelctl zone Asia/Tokyo"),
@@ -268,8 +268,8 @@ def test_publishing_in_place():
 
 # Before each call that changes something, a command is killed, or the call fails, once or from then
 # on. Then a reader finds the local zone, a failure is no success, and the same command completes
-# the work. What a killed command made and did not name is the next command's to remove; a version that
-# could not be withdrawn is said.
+# the work. What a killed command made and did not name is the next command's to remove; a version
+# that could not be withdrawn is said.
 CHANGING = r"(mkdir|symlink|rename|unlink|syncfs|fsync|fchmod)|openat.*O_CREAT|write\(\d+, \"\w"
 
 
@@ -408,6 +408,15 @@ def test_the_run():
     assert ctl("publish 2026b.1.0 DIR", "env", "PATH=/tmp/bin:" + os.environ["PATH"])[1] == 0
     os.rmdir("/run/systemd/system")
     assert Path("/tmp/asked").read_text() == "start kestrel.service\n"
+
+
+@pytest.mark.parametrize("name", ["Asia/Seoul", "Asia", "", "/etc/passwd", "Asia/../Japan", "..",
+                                  "./Japan", "Japan/", "localtime", "Etc/UTC\n", "+VERSION"])
+def test_no_zone(name):
+    before = found()
+    said = subprocess.run(["kestrelctl", "zone", name], capture_output=True, text=True, check=False)
+    assert said.returncode == 4 and "is no whole zone of the active copy" in said.stderr
+    assert found() == before
 
 
 def test_usage():

@@ -182,10 +182,9 @@ faults faults_of_copy(const std::string& path, const std::string& version,
 }
 
 bool has_zone(const std::string& path, const std::string& name) {
-  const std::filesystem::path relative = name;
-  const std::string file = zoneinfo_directory(path) + "/" + name;
-  return !name.empty() && relative.is_relative() && relative == relative.lexically_normal() &&
-         *relative.begin() != ".." && is_whole_zone(read_file(file).value_or(""));
+  const auto file = resolve_inside(zoneinfo_directory(path), name);
+  const bool is_plain = std::filesystem::path(name).lexically_normal() == name;
+  return file && is_plain && is_whole_zone(read_file(*file).value_or(""));
 }
 
 std::string release_of(const std::string& version) {

@@ -16,7 +16,9 @@
 [[nodiscard]] faults faults_of_copy(const std::string& path, const std::string& version,
                                     const std::string& shown);
 
-/// Whether the copy at `path` has the zone `name`, such as Europe/Paris, and that is whole.
+/// Whether the copy at `path` has the zone `name`, such as Europe/Paris, in its tree, and that is
+/// whole. A name that leads there by a detour is none, nor is one that leads out, as "localtime"
+/// may.
 [[nodiscard]] bool has_zone(const std::string& path, const std::string& name);
 
 /// The release of a version: 2026b for 2026b.1.0.
