@@ -62,9 +62,10 @@ void inspect_link(inspection& copy, const std::filesystem::path& inside,
                   const std::filesystem::path& twin) {
   const std::string target = link_target(copy.top / inside);
   const bool is_of_the_image = target.starts_with('/') && target == link_target(twin);
-  if (!is_of_the_image && !resolve_inside(copy.top, inside))
+  if (!is_of_the_image && !resolve_inside(copy.top, inside)) {
     copy.found.push_back(
         fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
+  }
 }
 
 void inspect_tree(inspection& copy) {
@@ -112,9 +113,10 @@ void inspect_release(inspection& copy, const std::string& version) {
   constexpr std::string_view head = "# version ";
   const std::string release = release_of(version);
   const auto compare = [&](const char* name, const std::string& found) {
-    if (found != release)
+    if (found != release) {
       copy.found.push_back(
           fault("%s is of release %s, not %s", {copy.name_of(copy.tree / name), found, release}));
+    }
   };
   const std::filesystem::path tree = copy.top / copy.tree;
   const std::string word = fs::read_first_word((tree / "+VERSION").c_str());
@@ -140,9 +142,10 @@ void inspect_bundles(inspection& copy) {
     std::error_code error;
     const std::filesystem::file_status status = entry.symlink_status(error);
     if (is_symlink(status)) {
-      if (!resolve_inside(copy.top, inside))
+      if (!resolve_inside(copy.top, inside)) {
         copy.found.push_back(
             fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
+      }
     } else if (!is_open_to_all(status)) {
       copy.found.push_back(closed_to_some(copy.name_of(inside), is_directory(status)));
       is_closed = true;

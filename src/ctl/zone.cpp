@@ -12,9 +12,10 @@ outcome set_zone(const std::string& name) {
   if (!now.view.current_path || !has_zone(*now.view.current_path, name))
     return refuse({outcome::unusable, {fault("%s is no whole zone of the active copy", {name})}});
   const std::string target = std::string(paths::zoneinfo_link) + "/" + name;
-  if (const std::string closed = closed_part(target); !closed.empty())
+  if (const std::string closed = closed_part(target); !closed.empty()) {
     return refuse(
         {outcome::unusable, {fault("not everyone can read %s", {closed}, "chmod a+rX it")}});
+  }
   if (is_there(localtime) && now.localtime_target.empty())
     return refuse({outcome::failed, {fault("%s is no link", {localtime}, "remove it")}});
   replace_link(target, paths::localtime_link, paths::new_localtime_link);
