@@ -2,6 +2,7 @@
 # With a scene's name as argument it makes that scene's world and no more.
 
 import os
+import random
 import re
 import subprocess
 import sys
@@ -105,6 +106,75 @@ def test_scene(name):
     assert (ended.stderr.splitlines(), ended.stdout.splitlines(), status) == (
         scene["2>"].splitlines(), scene["1>"].splitlines(), int(scene["exit"] or 0))
     assert found() == expected
+
+
+# Random worlds are made of these: a path and what may be there, first what is common. "-" is
+# nothing, and "?" one of the versions.
+VERSIONS = "2022b.1.0 2022b.1.0 2022c.1.0 2022c.1.0 2022z 2147483648a x /2022c.1.0".split()
+PIECES = [line.split() for line in """\
+/usr/share/zoneinfo.default/+VERSION =2022b =2022a =2022z =x =2147483648a / - >gone
+/usr/share/zoneinfo.default/Asia/Tokyo >/tmp/machine/share/zoneinfo/Asia/Tokyo -
+/usr/share/icu/icutzformat.txt =44l =44b = -
+/usr/share/zoneinfo >~/zoneinfo -
+tz/2022b.1.0/zoneinfo >/tmp/machine/share/zoneinfo -
+tz/2022b.1.0/icutz/icutz44l.dat = -
+tz/2022c.1.0/zoneinfo >/tmp/machine/share/zoneinfo -
+tz/2022c.1.0/icutz/icutz44l.dat = -
+tz/?/icutz/icutz44b.dat - =
+zoneinfo >~/tz/2022b.1.0/zoneinfo >/usr/share/zoneinfo.default >~/tz/?/zoneinfo >tz/?/x >~/tz/? - /
+icutz >~/tz/2022b.1.0/icutz >~/tz/?/icutz >../timezone/tz/?/icutz - / =
+tz_latest >~/tz/? - >tz/? >~/tz/ >/srv/? / =
+localtime >~/zoneinfo/Asia/Tokyo >/usr/share/zoneinfo/Asia/Tokyo >zoneinfo/Asia/Tokyo -
+zoneinfo.new - >~/tz/?/zoneinfo / =
+icutz.new - >~/tz/?/icutz >/usr/share/icu / =
+/var/db/icutz - >~/tz/?/icutz >/missing /
+/var/db/icu - / >/missing
+""".splitlines()]
+
+
+def random_world(dice):
+    odd, words = dice.choice((0.04, 0.1, 0.2, 0.5)), []
+    for path, usual, *others in PIECES:
+        what = dice.choice(others) if dice.random() < odd else usual
+        words += [(path + what).replace("?", dice.choice(VERSIONS))] * (what != "-")
+    return " ".join(words)
+
+
+# Asks kestrelctl what the next run will do, and holds what a run does against that. For the asking,
+# /etc/localtime is as it should be. Gives the first word of the answer, and whether all was well.
+def foretell(world):
+    make(world)
+    before = found()
+    asked = subprocess.run(f"""unshare -m sh -c 'mount -t tmpfs none /etc &&
+        ln -s {STORAGE}/localtime /etc && exec kestrelctl status'""",
+        shell=True, capture_output=True, text=True, check=False)
+    assert found() == before, f"status changes {world}"
+    run = subprocess.run("kestrel", capture_output=True, text=True, check=False)
+    after = found()
+    was, now = ([state.get(f"{STORAGE}/{link}", "")[:2] for link in ("zoneinfo", "icutz")]
+                for state in (before, after))
+    on_system, failed = now[0] == (">", "/usr/share/zoneinfo.default"), "Unable to" in run.stderr
+    reset, same = on_system and now != was, now[0] == was[0]
+    said, path = re.search("^next run: (.*?)(?: (/.*))?$", asked.stdout, re.M).groups("")
+    holds = {"keeps the active copy": same and not (failed and (reset or not on_system)),
+             "goes back to the system copy": reset,
+             "fails: it leaves the links as they are": same and failed and not reset,
+             "switches to": now == [(">", path + "/zoneinfo"), (">", path + "/icutz")] != was}
+    assert holds.get(said) and (asked.returncode or after == before), (
+        f"{asked.stdout}status {asked.returncode}, in {world}\n{run.stderr}{was} -> {now}")
+    return said.split()[0], asked.returncode == 0
+
+
+@pytest.mark.parametrize("name", [name for name in SCENES if not SCENES[name]["$"]])
+def test_foretold(name):
+    foretell(SCENES[name]["+"])
+
+
+# With RANDOM_WORLDS=2000 in the environment it takes that many.
+def test_foretold_in_random_worlds():
+    dice = random.Random(2022)
+    told = {foretell(random_world(dice)) for _ in range(int(os.environ.get("RANDOM_WORLDS", 150)))}
+    assert len({word for word, _ in told}) == 4 and ("keeps", True) in told
 
 
 if __name__ == "__main__":
