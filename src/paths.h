@@ -6,6 +6,7 @@ namespace paths {
 // The system copy, shipped read-only with the operating system.
 inline constexpr const char* system_zoneinfo = "/usr/share/zoneinfo.default";
 inline constexpr const char* system_icu = "/usr/share/icu";
+inline constexpr const char* system_schema = "/usr/share/icu/icutzformat.txt";
 
 // The storage. The path of a download is `downloads` followed by its version text.
 inline constexpr const char* storage = "/var/db/timezone/";

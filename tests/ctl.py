@@ -66,7 +66,7 @@ def ctl(line, *before):
 
 
 def sh(command):
-    return subprocess.run(command, shell=True, cwd=STORAGE, capture_output=True, check=False)
+    return subprocess.run(["bash", "-c", command], cwd=STORAGE, capture_output=True, check=False)
 
 
 def publish(*releases):
@@ -144,7 +144,7 @@ def test_versions(version, status, line):
     ("ln -s ../../../2026b.1.0/zoneinfo/Japan zoneinfo/New", "New is a link that leads out"),
     ("ln -s /tmp/fetched/zoneinfo/Japan zoneinfo/New", "zoneinfo/New is a link that leads out"),
     ("ln -s New zoneinfo/New", "zoneinfo/New is a link that leads out of the copy or nowhere"),
-    ("mv icutz/metaZones.res .; ln -s ../metaZones.res icutz", "metaZones.res is missing"),
+    ("mv icutz/metaZones.res .; ln -s ../metaZones.res icutz", "metaZones.res is a link that"),
     ("mkfifo zoneinfo/New", "zoneinfo/New is neither a file, nor a directory, nor a link"),
     pytest.param("chown 4321 zoneinfo/Etc", "zoneinfo/Etc belongs to another user: chown -R it",
                  marks=several_users),
@@ -181,9 +181,19 @@ ADD = "kestrelctl publish 2026b.1.0 /tmp/fetched"
      "chmod 644 $B/icutz/icutz44l.dat; kestrel"),
     ("chmod 700 tz", "not everyone can read /var/db/timezone/tz: chmod a+rX it", "chmod a+rX tz"),
     ("chmod 700 $B", "not everyone can read $B: chmod a+rX it", "chmod a+rX $B"),
-    ("rm $B/icutz/icutz44l.dat", "icutz44l.dat, the schema's file, is missing: start a run",
+    ("rm $B/icutz/icutz44l.dat", "icutz44l.dat is missing or no file: publish 2026b.1.0 again", ADD),
+    ("rm -r $B/icutz; : >$B/icutz", "icutz44l.dat is missing or no file: publish", ADD),
+    ("mv $B/icutz/icutz44{l,b}.dat", "has 44l: start a run of kestrel, and remove /var/db/timezone/"
+     "tz_latest", "kestrel; rm tz_latest"),
+    ("rm -r $B", "$B is missing: start a run of kestrel, and remove /var/db/timezone/tz_latest",
      "kestrel; rm tz_latest"),
-    ("rm -r $B", "$B is missing: start a run of kestrel", "rm tz_latest; kestrel"),
+    ("rm -r $B; : >$B", "$B is missing: start a run of kestrel, and", "kestrel; rm tz_latest"),
+    ("rm -r tz", "/var/db/timezone/tz/ is missing: mkdir -p it", "mkdir tz; kestrel; rm tz_latest"),
+    ("ln -sf ../+VERSION $B/zoneinfo/Asia/Tokyo", "Asia/Tokyo is not whole: publish", ADD),
+    ("ln -sfn Etc $B/zoneinfo/Japan", "zoneinfo/Japan is missing: publish", ADD),
+    ("mv $B/icutz /tmp/out; ln -s /tmp/out $B/icutz", "icutz is a link that leads out of the", ADD),
+    ("truncate -s 10G $B/zoneinfo/Etc/UTC", "Etc/UTC is not whole: publish", ADD),
+    ("echo >$B/zoneinfo/+VERSION", "+VERSION is of release , not 2026b: publish", ADD),
     ("ln -sfn $B zoneinfo", "leads to $B, which is no copy: start a run of kestrel", "kestrel"),
     ("ln -sfn tz/2026b.1.0/zoneinfo zoneinfo", "which is no copy: start a run", "kestrel"),
     ("ln -sfn $B/icutz zoneinfo", "which no program expects: kestrelctl back 2026b.1.0",
@@ -207,12 +217,22 @@ ADD = "kestrelctl publish 2026b.1.0 /tmp/fetched"
      "rmdir localtime; kestrelctl zone Asia/Tokyo"),
     ("ln -sfn zoneinfo/Asia/Tokyo localtime", "leads to zoneinfo/Asia/Tokyo, not into /var/db",
      "kestrelctl zone Asia/Tokyo"),
-    ("ln -sfn $PWD/zoneinfo/Asia localtime", "the local zone Asia is not in the active copy: kes",
+    ("ln -sfn $PWD/zoneinfo/Asia localtime", "the local zone Asia is not whole in the active",
      "kestrelctl zone Asia/Tokyo"),
+    ("ln -sfn $PWD/zoneinfo/+VERSION localtime", "the local zone +VERSION is not whole in the",
+     "kestrelctl zone Asia/Tokyo"),
+    ("ln -sfn $PWD/zoneinfo//Asia/Tokyo localtime", "the local zone /Asia/Tokyo is not whole in",
+     "kestrelctl zone Asia/Tokyo"),
+    ("mkdir withdrawn", "/var/db/timezone/withdrawn cannot be read: remove it", "rmdir withdrawn"),
+    ("ln -s $B/icutz icutz.new; rm icutz; mkdir icutz", "run of kestrel goes back to the system",
+     "rmdir icutz; kestrel"),
     ("ln -s $B/icutz icutz.new", "icutz.new is of a run that was killed: start a run", "kestrel"),
     ("ln -s /usr /var/db/icutz", "/var/db/icutz is of an older system: remove it", "rm ../icutz"),
     ("mkdir /var/db/icu", "/var/db/icu is of an older system: remove it", "rmdir ../icu"),
-    ("rm /usr/share/zoneinfo; mkdir /usr/share/zoneinfo", "ln -sfn /var/db/timezone/zoneinfo",
+    ("ln -s /usr /var/db/icu", "/var/db/icu is of an older system: remove it", "rm ../icu"),
+    ("chmod 600 /usr/share/icu/icutzformat.txt", "not everyone can read /usr/share/icu/icutzformat",
+     "chmod a+rX /usr/share/icu/icutzformat.txt"),
+    ("rm /usr/share/zoneinfo; mkdir /usr/share/zoneinfo", "remove it, and ln -sfn /var/db/timezone",
      "rmdir /usr/share/zoneinfo; ln -sfn /var/db/timezone/zoneinfo /usr/share/zoneinfo"),
     ("echo 2026c >$A/+VERSION", "$B is older than the system copy, 2026c.1.0: start", "kestrel"),
     ("echo 2147483648a >$A/+VERSION", "+VERSION does not name a release such as 2026b: repair",
@@ -225,6 +245,10 @@ ADD = "kestrelctl publish 2026b.1.0 /tmp/fetched"
      "echo 44l >/usr/share/icu/icutzformat.txt"),
     ("kestrelctl back; truncate -s 9 $A/Etc/UTC", "$A/Etc/UTC is not whole: repair the image",
      "cp $B/zoneinfo/Etc/UTC $A/Etc"),
+    ("kestrelctl back; echo x >$A/Asia/Tokyo", "$A/Asia/Tokyo is not whole: repair the image",
+     "cp $B/zoneinfo/Asia/Tokyo $A/Asia"),
+    ("cp -r $B tz/2026c; truncate -s 9 tz/2026c/zoneinfo/Etc/UTC; ln -sfn $PWD/tz/2026c tz_latest",
+     "2026c/zoneinfo/Etc/UTC is not whole: remove /var/db/timezone/tz_latest", "rm tz_latest"),
 ])
 def test_status(damage, line, cure):
     publish("2026b")
@@ -252,7 +276,7 @@ def test_replacement():
     publish("2026b")
     os.truncate(STORAGE / "tz/2026b.1.0/zoneinfo/Etc/UTC", 99)
     said = ctl("publish 2026b.1.0 DIR", *TRACER, "-e", "inject=renameat2:error=EINVAL")
-    assert said[1] == 1 and "kestrelctl back, remove it, and publish again" in said[0]
+    assert said[1] == 1 and "publish the data under a higher version" in said[0]
     publish("2026b")
     assert well() is True and os.listdir(STORAGE / "tz") == ["2026b.1.0"]
 
@@ -393,7 +417,8 @@ def test_order_of_writes():
     ctl("publish 2026b.1.0 DIR", "strace", "-fqqyo", str(TRACE))
     done = "\n".join(re.findall(r"(?:syncfs|execve|rename).* = 0", TRACE.read_text()))
     order = re.findall(r'syncfs|execve(?=.*kestrel")|(?<=timezone/)\S+(?="\) = 0)', done)
-    assert order == ["syncfs", "tz/2026b.1.0", "tz_latest", "syncfs", "execve", "zoneinfo", "icutz"]
+    assert order == ["syncfs", "tz/2026b.1.0", "syncfs", "tz_latest", "syncfs", "execve",
+                     "zoneinfo", "icutz"]
 
 
 def test_the_run():

@@ -7,6 +7,8 @@
 #include "ctl/withdrawn.h"
 #include "ctl/workplace.h"
 #include "dataset/vela_dataset.h"
+#include "dataset/vela_icu.h"
+#include "dataset/vela_zoneinfo.h"
 #include "fs/operations.h"
 #include "paths.h"
 
@@ -16,7 +18,7 @@ namespace {
 /// it leaves, and without `version`.
 version_set withdrawn_after(const device& now, const std::string& version) {
   const vela_version target = version_of(version.empty() ? now.system_version : version);
-  version_set withdrawn = now.withdrawn;
+  version_set withdrawn = *now.withdrawn;
   const bool is_download_active = !now.view.current_path.value_or("").empty();
   if (is_download_active && version_of(now.active_version) > target)
     withdrawn.insert(now.active_version);
@@ -27,16 +29,27 @@ version_set withdrawn_after(const device& now, const std::string& version) {
 
 /// The way back has priority: where the list cannot be written, it goes on.
 void withdraw(const device& now, const version_set& withdrawn) {
-  if (withdrawn == now.withdrawn) return;
+  if (withdrawn == *now.withdrawn) return;
   try {
     write_withdrawn(withdrawn);
   } catch (const std::system_error& failure) {
     for (const std::string& version : withdrawn) {
-      if (!now.withdrawn.contains(version)) {
+      if (!now.withdrawn->contains(version))
         complain(fault("%s is not withdrawn, and a downloader may publish it again", {version},
                        failure.what()));
-      }
     }
+    for (const std::string& version : *now.withdrawn) {
+      if (!withdrawn.contains(version))
+        complain(fault("%s is still withdrawn", {version}, failure.what()));
+    }
+  }
+}
+
+void name_newest(const std::string& path) {
+  if (path.empty()) {
+    fs::remove(paths::latest_link);
+  } else {
+    replace_link(path, paths::latest_link, new_latest_link);
   }
 }
 
@@ -49,14 +62,14 @@ outcome go_back(const std::string& version) {
     return refuse({outcome::failed, found});
   if (const faults found = faults_of_way_back(now, version); !found.empty())
     return refuse({outcome::unusable, found});
-  withdraw(now, withdrawn_after(now, version));
-  // Named first, so that no run in between undoes the rest.
-  if (path.empty()) {
-    fs::remove(paths::latest_link);
-  } else {
-    replace_link(path, paths::latest_link, new_latest_link);
+  // Both new links are staged before anything is changed: what fails then changes nothing.
+  if (!is_active(now, path)) {
+    stage_link(zoneinfo_directory(path), paths::zoneinfo_link, paths::new_zoneinfo_link);
+    if (!path.empty()) stage_link(icu_directory(path), paths::icu_link, paths::new_icu_link);
   }
-  vela_dataset(path).activate();
+  withdraw(now, withdrawn_after(now, version));
+  name_newest(path);  // before the rest, so that no run in between undoes that
+  if (!is_active(now, path)) vela_dataset(path).activate();
   sync_file_system(paths::storage);
 
   const device then = read_device();

@@ -33,11 +33,9 @@ struct inspection {
 /// `look` gives false where it is not to go into that directory.
 template <typename Look>
 void walk(const std::filesystem::path& top, const std::filesystem::path& below, Look look) {
-  std::error_code error;
   const auto options = std::filesystem::directory_options::skip_permission_denied;
-  std::filesystem::recursive_directory_iterator entry(top / below, options, error);
-  for (const std::filesystem::recursive_directory_iterator end; !error && entry != end;
-       entry.increment(error))
+  std::filesystem::recursive_directory_iterator entry(top / below, options);
+  for (; entry != std::filesystem::recursive_directory_iterator(); ++entry)
     if (!look(*entry, entry->path().lexically_relative(top))) entry.disable_recursion_pending();
 }
 
@@ -52,63 +50,95 @@ fault closed_to_some(const std::string& path, bool is_directory) {
   return fault("not everyone can read %s", {path}, is_directory ? "chmod 755 it" : "chmod 644 it");
 }
 
-bool is_zone_or_text(const std::string& content, const std::filesystem::path& twin) {
-  if (content.starts_with("TZif")) return is_whole_zone(content);
-  const bool is_text = !content.empty() && content.find('\0') == std::string::npos;
-  return is_text && !read_file(twin).value_or("").starts_with("TZif");
+/// The names of zones begin with capital letters, those of tables do not.
+bool is_zone_or_table(const std::string& content, const std::filesystem::path& name) {
+  const char first = name.filename().string().front();
+  const bool is_zone = content.starts_with("TZif") || (first >= 'A' && first <= 'Z');
+  if (is_zone) return is_whole_zone(content);
+  return !content.empty() && content.find('\0') == std::string::npos;
 }
 
+/// The image's link to the local zone, by which TZ=localtime works.
+constexpr const char* local_zone = "/etc/localtime";
+
+/// Where an entry of a copy leads; nothing where that is out of the copy, or nowhere. What an
+/// absolute link leads to that the system copy has too, its `twin`, is the image's own.
+std::optional<std::filesystem::path> end_of(const std::filesystem::path& top,
+                                            const std::filesystem::path& inside,
+                                            const std::filesystem::path& twin) {
+  const std::string target = link_target(top / inside);
+  if (target.starts_with('/') && target == link_target(twin)) return top / inside;
+  return resolve_inside(top, inside);
+}
+
+/// Where a link leads, a zone, a table or a directory has to be, inside of the copy.
 void inspect_link(inspection& copy, const std::filesystem::path& inside,
                   const std::filesystem::path& twin) {
-  const std::string target = link_target(copy.top / inside);
-  const bool is_of_the_image = target.starts_with('/') && target == link_target(twin);
-  if (!is_of_the_image && !resolve_inside(copy.top, inside)) {
+  if (link_target(copy.top / inside) == local_zone) return;
+  const auto end = end_of(copy.top, inside, twin);
+  std::error_code error;
+  if (!end) {
     copy.found.push_back(
         fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
+  } else if (!std::filesystem::is_directory(*end, error) &&
+             !is_zone_or_table(read_file(*end).value_or(""), inside)) {
+    copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
   }
+}
+
+/// Whether the directory `name` of the copy is one, inside of it, so that it can be looked at.
+bool inspect_top(inspection& copy, const std::filesystem::path& name) {
+  std::error_code error;
+  if (!std::filesystem::is_directory(copy.top / name, error)) {
+    copy.found.push_back(fault("%s is missing or no directory", {copy.name_of(name)}));
+  } else if (!resolve_inside(copy.top, name)) {
+    copy.found.push_back(
+        fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(name)}));
+  } else {
+    return true;
+  }
+  return false;
 }
 
 void inspect_tree(inspection& copy) {
   const std::filesystem::path system = paths::system_zoneinfo;
-  std::error_code error;
-  if (!std::filesystem::is_directory(copy.top / copy.tree, error))
-    copy.found.push_back(fault("%s is missing or no directory", {copy.name_of(copy.tree)}));
+  if (!inspect_top(copy, copy.tree)) return;
   walk(copy.top, copy.tree, [&](const directory_entry& entry, const auto& inside) {
-    const std::filesystem::path twin = system / inside.lexically_relative(copy.tree);
-    const std::filesystem::file_status status = entry.symlink_status(error);
+    const std::filesystem::file_status status = entry.symlink_status();
     if (is_symlink(status)) {
-      inspect_link(copy, inside, twin);
+      inspect_link(copy, inside, system / inside.lexically_relative(copy.tree));
     } else if (!is_directory(status) && !is_regular_file(status)) {
       copy.found.push_back(
           fault("%s is neither a file, nor a directory, nor a link", {copy.name_of(inside)}));
     } else if (!is_open_to_all(status)) {
       copy.found.push_back(closed_to_some(copy.name_of(inside), is_directory(status)));
     } else if (is_regular_file(status) &&
-               !is_zone_or_text(read_file(entry.path()).value_or(""), twin)) {
+               !is_zone_or_table(read_file(entry.path()).value_or(""), inside)) {
       copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
     }
     return true;
   });
 }
 
-/// What the system copy has; links that lead out of it are the image's own.
+/// What the system copy has; links that lead out of it are the image's own. A link of the copy that
+/// leads nowhere has its fault already.
 void inspect_missing(inspection& copy) {
   const std::filesystem::path system = paths::system_zoneinfo;
   walk(system, "", [&](const directory_entry& theirs, const auto& name) {
+    if (name == "+VERSION" || (theirs.is_symlink() && !resolve_inside(system, name))) return true;
     std::error_code error;
     const std::filesystem::path ours = copy.top / copy.tree / name;
-    const bool is_wanted = !theirs.is_symlink(error) || resolve_inside(system, name);
-    if (!is_wanted || std::filesystem::is_symlink(ours, error)) return true;
-    const bool is_directory = theirs.is_directory(error);
-    if (std::filesystem::exists(ours, error) &&
-        std::filesystem::is_directory(ours, error) == is_directory)
-      return true;
-    copy.found.push_back(fault("%s is missing", {copy.name_of(copy.tree / name)}));
+    const bool is_same_kind =
+        std::filesystem::is_directory(ours, error) == theirs.is_directory(error);
+    if (is_same_kind && std::filesystem::exists(ours, error)) return true;
+    const bool is_told = error == std::errc::permission_denied ||
+                         (is_there(ours) && !resolve_inside(copy.top, copy.tree / name));
+    if (!is_told) copy.found.push_back(fault("%s is missing", {copy.name_of(copy.tree / name)}));
     return false;
   });
 }
 
-/// Where a file of the tree names its release, it has to be that of the version.
+/// The files of the tree that name a release have to name that of the version.
 void inspect_release(inspection& copy, const std::string& version) {
   constexpr std::string_view head = "# version ";
   const std::string release = release_of(version);
@@ -119,28 +149,31 @@ void inspect_release(inspection& copy, const std::string& version) {
     }
   };
   const std::filesystem::path tree = copy.top / copy.tree;
-  const std::string word = fs::read_first_word((tree / "+VERSION").c_str());
-  if (!word.empty()) compare("+VERSION", word);
+  if (read_file(tree / "+VERSION")) {
+    compare("+VERSION", fs::read_first_word((tree / "+VERSION").c_str()));
+  } else if (!is_there(tree / "+VERSION")) {
+    copy.found.push_back(fault("%s is missing", {copy.name_of(copy.tree / "+VERSION")}));
+  }
   if (const auto source = read_file(tree / "tzdata.zi"); source && source->starts_with(head))
     compare("tzdata.zi", source->substr(head.size(), source->find('\n') - head.size()));
 }
 
 void inspect_schema(inspection& copy) {
   const std::string declared = vela_icu(copy.top).get_schema();
-  const std::string file = "icutz" + copy.schema + ".dat";
+  const std::string file = "icutz/icutz" + copy.schema + ".dat";
   if (declared.empty()) {
-    copy.found.push_back(fault("%s is missing", {copy.name_of("icutz/" + file)}));
+    copy.found.push_back(fault("%s is missing or no file", {copy.name_of(file)}));
   } else if (declared != copy.schema) {
     copy.found.push_back(fault("%s has schema %s, and the system copy has %s",
                                {copy.name_of("icutz"), declared, copy.schema}));
   }
 }
 
-void inspect_bundles(inspection& copy) {
-  bool is_closed = false;
+/// Whether everyone can read what is in the directory.
+bool inspect_modes_of_bundles(inspection& copy) {
+  const std::size_t before = copy.found.size();
   walk(copy.top, "icutz", [&](const directory_entry& entry, const auto& inside) {
-    std::error_code error;
-    const std::filesystem::file_status status = entry.symlink_status(error);
+    const std::filesystem::file_status status = entry.symlink_status();
     if (is_symlink(status)) {
       if (!resolve_inside(copy.top, inside)) {
         copy.found.push_back(
@@ -148,19 +181,24 @@ void inspect_bundles(inspection& copy) {
       }
     } else if (!is_open_to_all(status)) {
       copy.found.push_back(closed_to_some(copy.name_of(inside), is_directory(status)));
-      is_closed = true;
     }
     return false;
   });
-  if (!is_closed) inspect_schema(copy);
+  return copy.found.size() == before;
+}
+
+void inspect_bundles(inspection& copy) {
+  // Without a schema, the system copy is at fault, which is told elsewhere.
+  if (!inspect_top(copy, "icutz") || !inspect_modes_of_bundles(copy) || copy.schema.empty()) return;
+  inspect_schema(copy);
   for (const std::string name : {"zoneinfo64", "metaZones", "timezoneTypes", "windowsZones"}) {
     const std::filesystem::path inside = "icutz/" + name + ".res";
-    const std::optional<std::string> content = read_file(copy.top / inside);
-    if (!content) {
+    const std::string content = read_file(copy.top / inside).value_or("");
+    if (!is_there(copy.top / inside)) {
       copy.found.push_back(fault("%s is missing", {copy.name_of(inside)}));
-    } else if (!is_whole_bundle(*content)) {
+    } else if (!is_whole_bundle(content)) {
       copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
-    } else if (!copy.schema.empty() && !has_byte_order_of(copy.schema, *content)) {
+    } else if (!has_byte_order_of(copy.schema, content)) {
       copy.found.push_back(
           fault("%s has not the byte order of schema %s", {copy.name_of(inside), copy.schema}));
     }
@@ -185,9 +223,11 @@ faults faults_of_copy(const std::string& path, const std::string& version,
 }
 
 bool has_zone(const std::string& path, const std::string& name) {
-  const auto file = resolve_inside(zoneinfo_directory(path), name);
-  const bool is_plain = std::filesystem::path(name).lexically_normal() == name;
-  return file && is_plain && is_whole_zone(read_file(*file).value_or(""));
+  const std::filesystem::path tree = zoneinfo_directory(path);
+  const bool is_plain = std::filesystem::path(name).lexically_normal().string() == name;
+  if (!is_plain || name.starts_with('/') || link_target(tree / name) == local_zone) return false;
+  const auto file = end_of(tree, name, paths::system_zoneinfo / std::filesystem::path(name));
+  return file && is_whole_zone(read_file(*file).value_or(""));
 }
 
 std::string release_of(const std::string& version) {

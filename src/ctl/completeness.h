@@ -7,12 +7,14 @@
 /// What makes a copy of the data unfit for its readers. `path` is the directory of a download,
 /// empty for the system copy; `version` is its version text; `shown` is how the lines call `path`.
 ///
-/// Looked at is every entry: that a zone and a bundle is whole, no other file is empty, everyone
-/// can read it, and no link leads out of the copy or nowhere (a link that the system copy has as
-/// well is the image's own). In a download also: the release in "+VERSION" and "tzdata.zi", the
-/// schema and the byte order of the bundles, and that nothing is missing that the system copy has.
+/// Looked at is every entry of the tree: that each file with a zone's name is a whole zone and no
+/// other one is empty, that everyone can read it, and that each link leads to such a file or to a
+/// directory, inside of the copy (an absolute link that the image has too is the image's own). In a
+/// download also: the release in "+VERSION" and "tzdata.zi", the schema, the four bundles with
+/// their byte order, and that nothing is missing that the system copy has.
 ///
 /// A fault has a cure of its own where other modes are enough; otherwise the data has to come anew.
+/// Throws std::system_error where the disk or the system fails.
 [[nodiscard]] faults faults_of_copy(const std::string& path, const std::string& version,
                                     const std::string& shown);
 

@@ -15,9 +15,11 @@
 /// copied until then stays.
 [[nodiscard]] faults copy_download(const std::string& from, const std::string& to);
 
-/// Gives the directories and files of the download at `path`, which lies in the storage, the modes
-/// of a copy. No link is followed. Gives and throws what `copy_download` does.
-[[nodiscard]] faults set_modes(const std::string& path);
+/// What others than root, the caller and the storage's owner can change in the download at `path`:
+/// directories and files that are theirs, or that they can write. No link is followed. Throws
+/// std::system_error.
+[[nodiscard]] faults faults_of_ownership(const std::string& path);
 
 /// Whether both directories hold the same: names, links and contents. Only regular files are read.
+/// Throws std::system_error.
 [[nodiscard]] bool are_same(const std::string& one, const std::string& other);

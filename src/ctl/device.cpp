@@ -29,14 +29,15 @@ device read_device() {
   now.icutz_target = link_target(paths::icu_link);
   now.latest_target = link_target(paths::latest_link);
   now.localtime_target = link_target(paths::localtime_link);
-  now.system_version = fs::read_first_word(system_version_file) + ".1.0";
+  now.system_version = now.view.system ? now.view.system->get_version_string()
+                                       : fs::read_first_word(system_version_file) + ".1.0";
   now.active_version = "none";
   if (now.view.current_path) {
     now.active_version =
         now.view.current_path->empty() ? now.system_version : version_in(*now.view.current_path);
   }
   now.latest_version = version_in(now.latest_target);
-  now.system_schema = fs::read_first_word(schema_file);
+  now.system_schema = fs::read_first_word(paths::system_schema);
   const std::string through = std::string(paths::zoneinfo_link) + "/";
   if (now.localtime_target.starts_with(through))
     now.zone = now.localtime_target.substr(through.size());
@@ -61,5 +62,6 @@ vela_version version_of(const std::string& text) {
   } catch (const std::out_of_range&) {
     version = {};
   }
+  static_cast<void>(take_reports());
   return version;
 }

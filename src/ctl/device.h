@@ -1,13 +1,11 @@
 #pragma once
 
+#include <optional>
 #include <string>
 
 #include "ctl/next_run.h"
 #include "ctl/withdrawn.h"
 #include "dataset/vela_version.h"
-
-/// The file whose first word is the system copy's schema, such as 44l.
-inline constexpr const char* schema_file = "/usr/share/icu/icutzformat.txt";
 
 /// The file whose first word is the system copy's release, such as 2026b.
 inline constexpr const char* system_version_file = "/usr/share/zoneinfo.default/+VERSION";
@@ -28,7 +26,7 @@ struct device {
   std::string latest_version;  // empty where there is no tz_latest
   std::string system_schema;
   std::string zone;  // the local zone's name; empty where it is not reached through zoneinfo
-  version_set withdrawn;
+  std::optional<version_set> withdrawn;  // absent where the list cannot be read
 };
 
 /// Reads the device; prints nothing. Waits for nothing, whatever the storage holds.

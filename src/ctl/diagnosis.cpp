@@ -23,11 +23,8 @@ constexpr const char* repair = "repair the image";
 constexpr const char* start = "start a run of kestrel";
 constexpr const char* set_zone = "kestrelctl zone NAME";
 
-void append(faults& all, const faults& more) {
-  all.insert(all.end(), more.begin(), more.end());
-}
-
-bool is_directory(const std::string& path) {
+/// Whether `path` is a directory, links followed.
+bool leads_to_directory(const std::string& path) {
   std::error_code error;
   return std::filesystem::is_directory(path, error);
 }
@@ -43,15 +40,22 @@ faults with_cure(faults all, const std::string& cure) {
   return all;
 }
 
+/// What helps where the data of the active copy is not good.
+std::string cure_of_data(const device& now) {
+  return now.view.current_path.value_or("").empty()
+             ? repair
+             : "publish " + now.active_version + " again, from good data";
+}
+
 std::string way_back_to(const device& now) {
   return now.view.current_path.value_or("").empty() ? "kestrelctl back"
                                                     : "kestrelctl back " + now.active_version;
 }
 
-/// The copies that programs and runs read, as far as they are known.
+/// What programs and runs read, as far as it is known.
 std::vector<std::string> places_of_copies(const device& now) {
-  std::vector<std::string> places = {paths::system_zoneinfo, paths::system_icu, paths::storage,
-                                     paths::downloads};
+  std::vector<std::string> places = {paths::system_zoneinfo, system_version_file, paths::system_icu,
+                                     paths::system_schema,   paths::storage,      paths::downloads};
   for (const auto& path : {now.view.current_path, now.view.latest_path}) {
     if (path && path->starts_with(paths::downloads))
       places.insert(places.end(), {*path, zoneinfo_directory(*path), icu_directory(*path)});
@@ -61,6 +65,8 @@ std::vector<std::string> places_of_copies(const device& now) {
 
 faults faults_of_places(const device& now) {
   faults found;
+  for (const std::string place : {paths::storage, paths::downloads})
+    if (!is_there(place)) found.push_back(fault("%s is missing", {place}, "mkdir -p it"));
   for (const std::string& place : places_of_copies(now)) {
     const std::string closed = closed_part(place);
     const fault one("not everyone can read %s", {closed}, "chmod a+rX it");
@@ -74,7 +80,7 @@ faults faults_of_system(const device& now) {
   const std::string release = release_of(now.system_version);
   const std::string& schema = now.system_schema;
   faults found;
-  if (!is_directory(paths::system_zoneinfo)) {
+  if (!leads_to_directory(paths::system_zoneinfo)) {
     found.push_back(fault("%s is missing", {paths::system_zoneinfo}, repair));
   } else if (now.system_version == ".1.0") {
     found.push_back(fault("%s is missing, empty or unreadable", {system_version_file}, repair));
@@ -83,9 +89,9 @@ faults faults_of_system(const device& now) {
         fault("%s does not name a release such as 2026b", {system_version_file}, repair));
   }
   if (schema.empty()) {
-    found.push_back(fault("%s is missing, empty or unreadable", {schema_file}, repair));
+    found.push_back(fault("%s is missing, empty or unreadable", {paths::system_schema}, repair));
   } else if (data_file_schema("icutz" + schema + ".dat") != schema) {
-    found.push_back(fault("%s does not name a schema such as 44l", {schema_file}, repair));
+    found.push_back(fault("%s does not name a schema such as 44l", {paths::system_schema}, repair));
   }
   return found;
 }
@@ -97,7 +103,9 @@ faults faults_of_fitness(const device& now, const std::string& path, const vela_
   const std::string file = path + "/icutz/icutz" + now.system_schema + ".dat";
   if (schema.empty() && is_there(file) && !closed_part(file).empty())
     return {fault("not everyone can read %s", {closed_part(file)}, "chmod a+rX it")};
-  if (schema.empty()) return {fault("%s, the schema's file, is missing", {file})};
+  if (schema.empty())
+    return {fault("%s is missing or no file", {file},
+                  "publish " + path.substr(path.rfind('/') + 1) + " again, from good data")};
   if (schema != now.system_schema) {
     return {
         fault("%s has schema %s, and the system copy has %s", {path, schema, now.system_schema})};
@@ -112,6 +120,7 @@ faults faults_of_active_links(const device& now) {
   if (!now.view.current_path)
     return {fault("%s leads to %s, which is no copy", {zoneinfo, now.zoneinfo_target}, start)};
   const std::string& path = *now.view.current_path;
+  if (!path.empty() && version_of(now.active_version) == vela_version()) return {};
   if (now.zoneinfo_target != zoneinfo_directory(path)) {
     return {fault("%s leads to %s, which no program expects", {zoneinfo, now.zoneinfo_target},
                   way_back_to(now))};
@@ -124,44 +133,50 @@ faults faults_of_active_links(const device& now) {
 faults faults_of_active(const device& now) {
   if (!now.view.current_path) return {};
   const std::string& path = *now.view.current_path;
-  faults found;
   if (!path.empty()) {
-    if (!is_directory(path)) return {fault("%s is missing", {path}, start)};
+    const std::string leave = now.latest_target == path
+                                  ? std::string(start) + ", and remove " + paths::latest_link
+                                  : start;
+    if (!leads_to_directory(path)) return {fault("%s is missing", {path}, leave)};
     if (!now.view.current || version_of(now.active_version) == vela_version())
-      return {fault("%s has a name that is no version", {path}, start)};
-    found = faults_of_fitness(now, path, *now.view.current);
-    if (!found.empty()) return with_cure(found, start);
+      return {fault("%s has a name that is no version", {path}, leave)};
+    const faults found = faults_of_fitness(now, path, *now.view.current);
+    if (!found.empty()) return with_cure(found, leave);
   }
-  const std::string anew =
-      path.empty() ? repair : "publish " + now.active_version + " again, from good data";
   const std::string shown = path.empty() ? paths::system_zoneinfo : path;
-  return with_cure(faults_of_copy(path, now.active_version, shown), anew);
+  try {
+    return with_cure(faults_of_copy(path, now.active_version, shown), cure_of_data(now));
+  } catch (const std::system_error& failure) {
+    return {fault("%s cannot be read: %s", {shown, failure.what()}, cure_of_data(now))};
+  }
 }
 
 faults faults_of_latest(const device& now) {
   const std::string latest = paths::latest_link;
   const std::string& target = now.latest_target;
   const std::string cure = "remove " + latest;
-  if (is_other_than_link(paths::latest_link))
-    return {fault("%s is no link", {latest}, "remove it")};
   if (target.empty() || target == now.view.current_path) return {};
   if (!target.starts_with(paths::downloads) || now.latest_version == target)
     return {fault("%s leads to %s, which is no path of a download", {latest, target}, cure)};
   if (version_of(now.latest_version) == vela_version())
     return {fault("%s names %s, which is no version", {latest, now.latest_version}, cure)};
-  if (!is_directory(target)) return {fault("%s, the newest download, is missing", {target}, cure)};
-  faults found;
+  if (!leads_to_directory(target))
+    return {fault("%s, the newest download, is missing", {target}, cure)};
+  if (now.next.what == next_run::action::switches)
+    return with_cure(faults_of_way_back(now, now.latest_version), cure);
   if (now.view.latest && now.view.system && !now.view.latest->compatible_schema(*now.view.system))
-    found = faults_of_fitness(now, target, *now.view.latest);
-  return with_cure(found, cure);
+    return with_cure(faults_of_fitness(now, target, *now.view.latest), cure);
+  return {};
 }
 
-faults faults_of_next_run(const device& now) {
+/// A run is the cure where nothing else is wrong.
+faults faults_of_next_run(const device& now, bool is_last) {
   using enum next_run::action;
+  const std::string others = "see the other lines";
   if (now.next.what == keeps) return {};
   if (now.next.what != fails)
-    return {fault("the next run of kestrel %s", {to_text(now.next)}, start)};
-  faults found = {fault("the next run of kestrel %s", {"fails"}, "see the other lines")};
+    return {fault("the next run of kestrel %s", {to_text(now.next)}, is_last ? start : others)};
+  faults found = {fault("the next run of kestrel %s", {"fails"}, others)};
   if (!now.view.can_change_storage) {
     found.push_back(fault("%s is missing, read-only, or append-only", {paths::storage},
                           "make it a directory that can be changed"));
@@ -179,7 +194,8 @@ faults faults_of_remains(const device& now) {
     found.push_back(fault("%s is of an older system", {paths::legacy_icu_link}, "remove it"));
   std::error_code error;
   if (is_there(paths::legacy_icu) &&
-      (!is_directory(paths::legacy_icu) || std::filesystem::is_empty(paths::legacy_icu, error)))
+      (!std::filesystem::is_directory(std::filesystem::symlink_status(paths::legacy_icu, error)) ||
+       std::filesystem::is_empty(paths::legacy_icu, error) || error))
     found.push_back(fault("%s is of an older system", {paths::legacy_icu}, "remove it"));
   return found;
 }
@@ -195,9 +211,12 @@ faults faults_of_zone(const device& now) {
   }
   if (!now.view.current_path || has_zone(*now.view.current_path, now.zone)) return {};
   const std::string file = zoneinfo_directory(*now.view.current_path) + "/" + now.zone;
-  std::error_code error;
-  if (std::filesystem::is_regular_file(file, error)) return {};  // see faults_of_active
-  return {fault("the local zone %s is not in the active copy", {now.zone}, set_zone)};
+  const std::string twin = zoneinfo_directory("") + "/" + now.zone;
+  if (::faccessat(AT_FDCWD, file.c_str(), R_OK, AT_EACCESS) != 0 && errno == EACCES) return {};
+  const bool is_zone = read_file(file).value_or("").starts_with("TZif") ||
+                       (has_zone("", now.zone) && is_there(twin));
+  return {fault("the local zone %s is not whole in the active copy", {now.zone},
+                is_zone ? cure_of_data(now) : set_zone)};
 }
 
 /// Programs find the links by these, which the image sets.
@@ -205,7 +224,9 @@ faults faults_of_entrance(const std::string& entrance, const std::string& link) 
   const std::filesystem::path target =
       std::filesystem::path(entrance).parent_path() / link_target(entrance);
   if (target.lexically_normal() == link) return {};
-  return {fault("%s does not lead to %s", {entrance, link}, "ln -sfn " + link + " " + entrance)};
+  const std::string first = is_other_than_link(entrance.c_str()) ? "remove it, and " : "";
+  return {fault("%s does not lead to %s", {entrance, link},
+                first + "ln -sfn " + link + " " + entrance)};
 }
 
 }  // namespace
@@ -215,8 +236,9 @@ faults faults_of(const device& now) {
   if (is_blind(now)) return found;
   for (const auto& subject :
        {faults_of_system, faults_of_link_places, faults_of_active_links, faults_of_active,
-        faults_of_latest, faults_of_next_run, faults_of_remains, faults_of_zone})
+        faults_of_latest, faults_of_remains, faults_of_zone})
     append(found, subject(now));
+  append(found, faults_of_next_run(now, found.empty()));
   append(found, faults_of_entrance("/etc/localtime", paths::localtime_link));
   append(found, faults_of_entrance(paths::legacy_zoneinfo, paths::zoneinfo_link));
   static_cast<void>(take_reports());
@@ -225,7 +247,8 @@ faults faults_of(const device& now) {
 
 bool is_blind(const device& now) {
   const auto is_closed_to_us = [](const std::string& place) {
-    return ::faccessat(AT_FDCWD, place.c_str(), R_OK | X_OK, AT_EACCESS) != 0 && errno == EACCES;
+    const int needed = leads_to_directory(place) ? R_OK | X_OK : R_OK;
+    return ::faccessat(AT_FDCWD, place.c_str(), needed, AT_EACCESS) != 0 && errno == EACCES;
   };
   return std::ranges::any_of(places_of_copies(now), is_closed_to_us);
 }
@@ -238,6 +261,9 @@ faults faults_of_link_places(const device& now) {
     found.push_back(fault("%s is no link", {zoneinfo}, std::string("remove it, and ") + start));
   if (is_other_than_link(paths::icu_link))
     found.push_back(fault("%s is no link", {icutz}, "remove it, and " + way_back_to(now)));
+  if (is_other_than_link(paths::latest_link))
+    found.push_back(fault("%s is no link", {paths::latest_link}, "remove it"));
+  if (!now.withdrawn) found.push_back(fault("%s cannot be read", {withdrawn_list}, "remove it"));
   return found;
 }
 
@@ -247,7 +273,7 @@ faults faults_of_way_back(const device& now, const std::string& version) {
     return {fault("%s does not name a release such as 2026b", {system_version_file}, repair)};
   faults found;
   if (!path.empty()) {
-    if (!is_directory(path)) return {fault("%s is missing", {path})};
+    if (!leads_to_directory(path)) return {fault("%s is missing", {path})};
     found = faults_of_fitness(now, path, vela_dataset(path));
     if (found.empty()) found = faults_of_copy(path, version, path);
   }
@@ -259,11 +285,8 @@ faults faults_of_way_back(const device& now, const std::string& version) {
 
 std::vector<std::string> downloads_to_go_back_to(const device& now) {
   std::vector<std::string> versions;
-  std::error_code error;
-  std::filesystem::directory_iterator entry(paths::downloads, error);
-  for (const std::filesystem::directory_iterator end; !error && entry != end;
-       entry.increment(error)) {
-    const std::string version = entry->path().filename();
+  for (const auto& entry : std::filesystem::directory_iterator(paths::downloads)) {
+    const std::string version = entry.path().filename();
     if (version_of(version) != vela_version() && faults_of_way_back(now, version).empty())
       versions.push_back(version);
   }

@@ -7,6 +7,10 @@ fault::fault(std::string_view format, std::initializer_list<std::string> texts,
              std::string what_to_do)
     : what(filled(format, texts)), cure(std::move(what_to_do)) {}
 
+void append(faults& all, const faults& more) {
+  all.insert(all.end(), more.begin(), more.end());
+}
+
 std::string filled(std::string_view format, std::span<const std::string> texts) {
   std::string line;
   for (const std::string& text : texts) {

@@ -18,6 +18,9 @@ struct fault {
 };
 using faults = std::vector<fault>;
 
+/// Adds what is in `more` to `all`.
+void append(faults& all, const faults& more);
+
 /// `format` with each "%s" replaced by the next of `texts`.
 [[nodiscard]] std::string filled(std::string_view format, std::span<const std::string> texts);
 

@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <array>
+#include <cerrno>
 #include <cstddef>
 #include <deque>
 #include <system_error>
@@ -13,25 +14,31 @@
 
 namespace {
 
-bool is_regular(int file) {
-  struct stat found {};
-  return ::fstat(file, &found) == 0 && S_ISREG(found.st_mode);
+/// Whether it is the disk or the system that fails, and not the entry that is another one.
+bool is_hard(int error) {
+  return error == EIO || error == EMFILE || error == ENFILE || error == ENOMEM;
 }
 
 }  // namespace
 
+void check(bool done, const std::string& path) {
+  if (!done) throw std::system_error(errno, std::generic_category(), path);
+}
+
 std::optional<std::string> read_file(const std::string& path) {
-  constexpr std::size_t limit = 16U << 20U;
+  constexpr off_t limit = 2L << 20;
   struct stat found {};
   if (::stat(path.c_str(), &found) != 0 || !S_ISREG(found.st_mode)) return {};
   // O_NONBLOCK and the second look are for an entry that changes in between.
   const fs::descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-  if (!file.is_open() || !is_regular(file.get())) return {};
+  check(file.is_open() || !is_hard(errno), path);
+  if (!file.is_open() || ::fstat(file.get(), &found) != 0 || !S_ISREG(found.st_mode)) return {};
+  if (found.st_size > limit) return {};
   std::string content;
   std::array<char, 65536> block;
-  while (content.size() <= limit) {
+  while (content.size() <= static_cast<std::size_t>(limit)) {
     const ssize_t count = ::read(file.get(), block.data(), block.size());
-    if (count < 0) return {};
+    check(count >= 0, path);
     if (count == 0) return content;
     content.append(block.data(), static_cast<std::size_t>(count));
   }

@@ -4,11 +4,14 @@
 #include <optional>
 #include <string>
 
-// Looking at files that anybody may have made. Nothing here waits, throws std::bad_alloc at most,
-// or prints.
+// Looking at files that anybody may have made. Nothing here waits or prints.
 
-/// The content of the regular file at `path`, links followed. Nothing where it cannot be read, is a
-/// FIFO or a device, which is not opened, or has more than 16 MiB.
+/// Throws std::system_error with the number in errno and the path, where `done` is false.
+void check(bool done, const std::string& path);
+
+/// The content of the regular file at `path`, links followed. Nothing where it is missing or may
+/// not be read, is a FIFO or a device, which is not opened, or has more than 2 MiB. Throws
+/// std::system_error where the disk or the system fails, so that nobody takes it for a bad file.
 [[nodiscard]] std::optional<std::string> read_file(const std::string& path);
 
 /// The content of the link at `path`; empty where there is none, or it cannot be read.

@@ -1,6 +1,7 @@
 #include <sys/stat.h>
 
 #include <cerrno>
+#include <csignal>
 #include <cstddef>
 #include <functional>
 #include <iostream>
@@ -60,11 +61,11 @@ outcome change(const command& chosen, const words& arguments) {
     return refuse({outcome::not_now,
                    {fault("another kestrelctl is at work", {}, "start again when it has ended")}});
   }
-  clear_leftovers();
+  if (clear_leftovers()) say(std::string("removed ") + workshop_path);
   return chosen.run(arguments);
 }
 
-outcome run(const command& chosen, const words& arguments) {
+outcome run_command(const command& chosen, const words& arguments) {
   if (arguments.size() < chosen.least || arguments.size() > chosen.most)
     return refuse({outcome::wrong_usage, {fault(usage())}});
   if (chosen.takes_version && !arguments.empty() && version_of(arguments[0]) == vela_version()) {
@@ -76,10 +77,10 @@ outcome run(const command& chosen, const words& arguments) {
   return chosen.run(arguments);
 }
 
-outcome run(const words& line) {
+outcome run_line(const words& line) {
   const std::string name = line.empty() ? "" : line[0];
   for (const command& each : commands())
-    if (name == each.name) return run(each, {line.begin() + 1, line.end()});
+    if (name == each.name) return run_command(each, {line.begin() + 1, line.end()});
   if (line == words{"--version"}) {
     say("kestrelctl " KESTREL_VERSION);
   } else if (line == words{"--help"}) {
@@ -99,7 +100,7 @@ outcome status_of(int error) {
 
 outcome run_or_explain(const words& line) {
   try {
-    return run(line);
+    return run_line(line);
   } catch (const std::system_error& failure) {
     complain(fault(failure.what()));
     return status_of(failure.code().value());
@@ -115,6 +116,9 @@ outcome run_or_explain(const words& line) {
 }  // namespace
 
 int main(int count, char** arguments) {
+  // A closed pipe and a file-size limit are then ordinary failed writes.
+  static_cast<void>(std::signal(SIGPIPE, SIG_IGN));
+  static_cast<void>(std::signal(SIGXFSZ, SIG_IGN));
   ::umask(S_IWGRP | S_IWOTH);  // what is made is for everyone to read
   const outcome end = run_or_explain({arguments + 1, arguments + count});
   if (std::cout.flush()) return static_cast<int>(end);

@@ -5,6 +5,7 @@
 #include <sys/statvfs.h>
 
 #include "ctl/files.h"
+#include "dataset/vela_icu.h"
 #include "paths.h"
 #include "startup/dataset_links.h"
 #include "startup/select_dataset.h"
@@ -21,7 +22,7 @@ auto attempt(Read read) -> std::optional<decltype(read())> {
   }
 }
 
-bool is_directory(const char* path) {
+bool is_real_directory(const char* path) {
   struct stat found {};
   return ::lstat(path, &found) == 0 && S_ISDIR(found.st_mode);
 }
@@ -41,6 +42,9 @@ std::optional<std::string> chosen_path(const run_view& view) {
   const std::string system;
   if (!view.latest_path || !view.current) return system;
   const bool stays = view.current_path && may_stay(*view.current, *view.system);
+  // Then the run throws before it looks at the latest dataset.
+  const bool can_finish = view.can_change_storage && !view.is_icutz_directory;
+  if (stays && view.has_to_finish && !can_finish) return system;
   if (!view.latest_path->empty()) {
     if (!view.latest) return system;
     if (may_replace(*view.latest, *view.current, *view.system)) return view.latest_path;
@@ -59,10 +63,12 @@ run_view read_as_a_run() {
   if (view.latest_path && !view.latest_path->empty())
     view.latest = attempt([&view] { return vela_dataset(*view.latest_path); });
   view.can_change_storage = can_change_storage();
-  view.is_zoneinfo_directory = is_directory(paths::zoneinfo_link);
-  view.is_icutz_directory = is_directory(paths::icu_link);
+  view.is_zoneinfo_directory = is_real_directory(paths::zoneinfo_link);
+  view.is_icutz_directory = is_real_directory(paths::icu_link);
   view.is_system_active = link_target(paths::zoneinfo_link) == paths::system_zoneinfo &&
                           (view.is_icutz_directory || !is_there(paths::icu_link));
+  const std::string path = view.current_path.value_or("");
+  view.has_to_finish = !path.empty() && link_target(paths::new_icu_link) == icu_directory(path);
   return view;
 }
 

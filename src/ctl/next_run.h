@@ -20,6 +20,7 @@ struct run_view {
   bool is_zoneinfo_directory = false;
   bool is_icutz_directory = false;
   bool is_system_active = false;  // zoneinfo names the system copy, and there is no icutz to remove
+  bool has_to_finish = false;     // a killed run left the ICU link of the current download undone
 };
 
 /// What a run does with the links to the active copy.

@@ -8,7 +8,6 @@
 #include "ctl/diagnosis.h"
 #include "ctl/files.h"
 #include "ctl/print.h"
-#include "ctl/workplace.h"
 #include "paths.h"
 
 namespace {
@@ -61,7 +60,8 @@ outcome prune() {
   outcome end = outcome::done;
   for (const std::string& version : superfluous) {
     try {
-      remove_and_say(path_of(version));
+      std::filesystem::remove_all(path_of(version));
+      say("removed " + path_of(version));
     } catch (const std::system_error& failure) {
       complain(fault("%s cannot be removed", {path_of(version)}, failure.code().message()));
       end = outcome::failed;

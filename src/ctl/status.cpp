@@ -1,3 +1,5 @@
+#include <system_error>
+
 #include "ctl/commands.h"
 #include "ctl/device.h"
 #include "ctl/diagnosis.h"
@@ -35,9 +37,14 @@ outcome print_status() {
   if (!is_blind(now)) print("next run", to_text(now.next));
   print("zone", now.zone);
   print("last switch", last_switch());
-  print("downloads", joined(downloads_to_go_back_to(now)));
-  print("withdrawn", joined(now.withdrawn));
-  const faults found = faults_of(now);
+  faults found;
+  try {
+    if (!is_blind(now)) print("downloads", joined(downloads_to_go_back_to(now)));
+  } catch (const std::system_error& failure) {
+    found.push_back(fault("the downloads cannot be read: %s", {failure.what()}));
+  }
+  print("withdrawn", joined(now.withdrawn.value_or(version_set())));
+  append(found, faults_of(now));
   complain_all(found);
   return found.empty() ? outcome::done : outcome::failed;
 }

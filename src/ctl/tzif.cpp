@@ -26,10 +26,10 @@ std::uint64_t take_number(std::string_view& rest) {
 
 /// Whether each type of local time has a flag that is one, and an abbreviation inside the table.
 bool are_types_sound(std::string_view types, std::string_view abbreviations) {
-  for (; !types.empty(); types.remove_prefix(6)) {
-    const bool ends = abbreviations.find('\0', byte_at(types, 5)) != std::string_view::npos;
-    if (byte_at(types, 4) > 1 || !ends) return false;
-  }
+  const std::size_t last_end = abbreviations.rfind('\0');
+  if (last_end == std::string_view::npos) return false;
+  for (; !types.empty(); types.remove_prefix(6))
+    if (byte_at(types, 4) > 1 || byte_at(types, 5) > last_end) return false;
   return true;
 }
 

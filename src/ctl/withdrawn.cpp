@@ -10,8 +10,10 @@
 #include "fs/descriptor.h"
 #include "paths.h"
 
-version_set read_withdrawn() {
-  std::istringstream lines(read_file(withdrawn_list).value_or(""));
+std::optional<version_set> read_withdrawn() {
+  const std::optional<std::string> content = read_file(withdrawn_list);
+  if (!content && is_there(withdrawn_list)) return {};
+  std::istringstream lines(content.value_or(""));
   version_set versions;
   for (std::string version; lines >> version;) versions.insert(version);
   return versions;

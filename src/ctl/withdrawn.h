@@ -1,5 +1,6 @@
 #pragma once
 
+#include <optional>
 #include <set>
 #include <string>
 
@@ -8,8 +9,9 @@ inline constexpr const char* withdrawn_list = "/var/db/timezone/withdrawn";
 
 using version_set = std::set<std::string>;
 
-/// The versions in the list, one a line; none where there is no list.
-[[nodiscard]] version_set read_withdrawn();
+/// The versions in the list, one a line; none where there is no list. Nothing where it cannot be
+/// read.
+[[nodiscard]] std::optional<version_set> read_withdrawn();
 
 /// Replaces the list in one step, on the disk as well when this returns. Where the set is empty,
 /// there is no list afterwards. Throws std::system_error; the old list stays then.

@@ -11,23 +11,9 @@
 #include <filesystem>
 #include <system_error>
 
-#include "ctl/print.h"
+#include "ctl/files.h"
 #include "fs/operations.h"
 #include "paths.h"
-
-namespace {
-
-bool try_lock(int directory) {
-  const bool locked = ::flock(directory, LOCK_EX | LOCK_NB) == 0;
-  check(locked || errno == EWOULDBLOCK, paths::downloads);
-  return locked;
-}
-
-}  // namespace
-
-void check(bool done, const char* path) {
-  if (!done) throw std::system_error(errno, std::generic_category(), path);
-}
 
 void become_storage_owner() {
   struct stat storage {};
@@ -55,8 +41,11 @@ faults faults_of_storage() {
 }
 
 storage_lock::storage_lock()
-    : directory(::open(paths::downloads, O_RDONLY | O_DIRECTORY | O_CLOEXEC)),
-      held((check(directory.is_open(), paths::downloads), try_lock(directory.get()))) {}
+    : directory(::open(paths::downloads, O_RDONLY | O_DIRECTORY | O_CLOEXEC)) {
+  check(directory.is_open(), paths::downloads);
+  held = ::flock(directory.get(), LOCK_EX | LOCK_NB) == 0;
+  check(held || errno == EWOULDBLOCK, paths::downloads);
+}
 
 workshop::workshop() {
   check(::mkdir(workshop_path, S_IRWXU) == 0, workshop_path);
@@ -67,27 +56,28 @@ workshop::~workshop() {
   std::filesystem::remove_all(workshop_path, ignored);
 }
 
-void clear_leftovers() {
-  remove_and_say(workshop_path);
+bool clear_leftovers() {
+  std::error_code ignored;
   fs::unstage_symlink(new_latest_link);
-  static_cast<void>(::unlink(new_withdrawn_list));
+  std::filesystem::remove(new_withdrawn_list, ignored);
+  const auto removed = std::filesystem::remove_all(workshop_path, ignored);
+  return !ignored && removed > 0;
 }
 
-void remove_and_say(const std::string& path) {
-  if (std::filesystem::remove_all(path) > 0) say("removed " + path);
+void stage_link(const std::string& target, const char* link, const char* staged) {
+  if (fs::stage_symlink(target.c_str(), staged)) return;
+  const int error = errno;
+  fs::require_room(target.c_str(), link);
+  errno = error;
+  check(error == EEXIST || error == ENOSPC || error == EDQUOT, staged);
 }
 
 void replace_link(const std::string& target, const char* link, const char* staged) {
+  if (fs::is_symlink_to(target.c_str(), link)) return;
+  stage_link(target, link, staged);
   if (fs::replace_symlink(target.c_str(), link, staged)) return;
   fs::remove(link);
   fs::create_symlink(target.c_str(), link);
-}
-
-bool is_one_file_system() {
-  struct stat storage {};
-  struct stat downloads {};
-  return ::stat(paths::storage, &storage) == 0 && ::stat(paths::downloads, &downloads) == 0 &&
-         storage.st_dev == downloads.st_dev;
 }
 
 void sync_file_system(const char* directory) {

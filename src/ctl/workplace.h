@@ -15,9 +15,6 @@ inline constexpr const char* new_download = "/var/db/timezone/tz/.kestrelctl/dow
 inline constexpr const char* new_latest_link = "/var/db/timezone/tz_latest.new";
 inline constexpr const char* new_withdrawn_list = "/var/db/timezone/withdrawn.new";
 
-/// Throws std::system_error with the number in errno and the path, where `done` is false.
-void check(bool done, const char* path);
-
 /// As root, continues as the owner of the storage: nothing that this owner has put there leads to a
 /// file of root's then. Does nothing for other users. Throws std::system_error where it cannot.
 void become_storage_owner();
@@ -30,8 +27,8 @@ void become_storage_owner();
 /// ends, however that is.
 class storage_lock final {
  public:
-  /// Tries to take the lock, and does not wait. Throws std::system_error where tz/ cannot be
-  /// opened.
+  /// Tries to take the lock, and does not wait. Throws std::system_error where that fails
+  /// otherwise.
   storage_lock();
 
   /// Whether this command has the lock; if not, another one is at work.
@@ -39,7 +36,7 @@ class storage_lock final {
 
  private:
   fs::descriptor directory;
-  bool held;
+  bool held = false;
 };
 
 /// The directory at `workshop_path`, while it is needed.
@@ -55,20 +52,19 @@ class workshop final {
   workshop& operator=(const workshop&) = delete;
 };
 
-/// Removes what a killed command left, so that a full disk has that room again. Prints each path on
-/// standard output. To be called with the lock. Throws std::system_error on failure.
-void clear_leftovers();
+/// Removes what a killed command left, so that a full disk has that room again. Whether it removed
+/// a download. To be called with the lock. What cannot be removed stays: a way back needs none of
+/// it.
+[[nodiscard]] bool clear_leftovers();
 
-/// Removes what is at `path`, with all that is in it, and prints "removed PATH" on standard output;
-/// does nothing where there is nothing. Throws std::system_error on failure.
-void remove_and_say(const std::string& path);
+/// Makes sure that a link to `target` is at `staged`, for `link`, before anything is changed. Not
+/// so where something that is no link is at `staged`, or where there is no room but a removal makes
+/// some. Throws `int` where there is no room, and std::system_error for all else.
+void stage_link(const std::string& target, const char* link, const char* staged);
 
-/// Replaces `link` by a link to `target`, staged at `staged`: in one step, or by a removal and a
-/// creation. Throws `int` where that fails.
+/// Makes `link` a link to `target`, staged at `staged`: in one step or, where `stage_link` could
+/// not stage it, by a removal and a creation. Throws what `stage_link` does, and `int`.
 void replace_link(const std::string& target, const char* link, const char* staged);
-
-/// Whether the storage and tz/ are on one file system.
-[[nodiscard]] bool is_one_file_system();
 
 /// Writes all that the file system of `directory` holds to the disk. Throws std::system_error.
 void sync_file_system(const char* directory);

@@ -65,8 +65,7 @@ vela_icu::vela_icu(const std::string& path)
 
 void vela_icu::initialize() {
   const bool is_download = !dataset_path.empty();
-  schema = is_download ? find_schema(icu_path.c_str())
-                       : fs::read_first_word((icu_path + "/icutzformat.txt").c_str());
+  schema = is_download ? find_schema(icu_path.c_str()) : fs::read_first_word(paths::system_schema);
   if (is_download && schema.empty())
     fs::report(0, "No ICU schema found for %s", {dataset_path.c_str()});
 }
