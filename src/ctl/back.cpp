@@ -34,9 +34,10 @@ void withdraw(const device& now, const version_set& withdrawn) {
     write_withdrawn(withdrawn);
   } catch (const std::system_error& failure) {
     for (const std::string& version : withdrawn) {
-      if (!now.withdrawn->contains(version))
+      if (!now.withdrawn->contains(version)) {
         complain(fault("%s is not withdrawn, and a downloader may publish it again", {version},
                        failure.what()));
+      }
     }
     for (const std::string& version : *now.withdrawn) {
       if (!withdrawn.contains(version))

@@ -77,7 +77,6 @@ faults faults_of_places(const device& now) {
 }
 
 faults faults_of_system(const device& now) {
-  const std::string release = release_of(now.system_version);
   const std::string& schema = now.system_schema;
   faults found;
   if (!leads_to_directory(paths::system_zoneinfo)) {

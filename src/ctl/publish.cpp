@@ -66,18 +66,19 @@ std::optional<refusal> judge_version(const device& now, const candidate& wanted)
 /// Why a download that is there is not fit to be named; empty where it is.
 faults faults_of_download(const device& now, const std::string& path, const candidate& wanted) {
   faults found = faults_of_copy(path, wanted.version, wanted.directory);
-  if (!now.zone.empty() && !has_zone(path, now.zone))
+  if (!now.zone.empty() && !has_zone(path, now.zone)) {
     found.push_back(
         fault("%s has not the local zone, %s", {wanted.directory + "/zoneinfo", now.zone}));
+  }
   return found;
 }
 
 /// Gives the download its name in one step; where a damaged one has it, the two change places.
 std::optional<refusal> name_download(const std::string& path) {
   if (!is_there(path)) {
-    check(::rename(new_download, path.c_str()) == 0, path.c_str());
+    check(::rename(new_download, path.c_str()) == 0, path);
   } else if (::renameat2(AT_FDCWD, new_download, AT_FDCWD, path.c_str(), RENAME_EXCHANGE) != 0) {
-    check(errno == EINVAL || errno == ENOSYS, path.c_str());
+    check(errno == EINVAL || errno == ENOSYS, path);
     return refusal{outcome::failed,
                    {fault("%s is damaged, and this file system cannot replace it in one step",
                           {path}, "publish the data under a higher version")}};
