@@ -1,4 +1,4 @@
-# What an image gets: the tools, their manuals, the unit, the documents.
+# What an image gets: the tools, their manuals, the unit, the documents, the examples.
 include(GNUInstallDirs)
 set(KESTREL_UNIT_DIR lib/systemd/system CACHE STRING
   "The directory of the systemd unit, relative to the prefix unless absolute")
@@ -13,3 +13,4 @@ install(FILES ${PROJECT_BINARY_DIR}/man/kestrel.8 ${PROJECT_BINARY_DIR}/man/kest
 install(FILES ${PROJECT_BINARY_DIR}/systemd/kestrel.service DESTINATION ${KESTREL_UNIT_DIR})
 install(FILES README.md CHANGELOG.md LICENSE TYPE DOC)
 install(DIRECTORY docs TYPE DOC)
+install(DIRECTORY examples TYPE DOC USE_SOURCE_PERMISSIONS)
