@@ -359,6 +359,14 @@ def test_prune():
         "2026b.1.0", "2026c.1.0", "2026d.1.0", "2026e", "2026x", "2026y", "2026z", "lost+found"]
 
 
+def test_prune_keeps_no_withdrawn_copy_but_the_last():
+    publish("2026b", "2026c")
+    ctl("back 2026b.1.0")
+    assert ctl("prune") == ("", 0)
+    publish("2026d")
+    assert ctl("prune") == ("removed /var/db/timezone/tz/2026c.1.0\n", 0)
+
+
 def test_one_at_a_time():
     lock = os.open(STORAGE / "tz", os.O_RDONLY)
     fcntl.flock(lock, fcntl.LOCK_EX)

@@ -29,7 +29,8 @@ bool is_real_directory(const char* path) {
 
 /// Whether root can change entries of the storage, if there is room.
 bool can_change_storage() {
-  constexpr unsigned fixed = STATX_ATTR_IMMUTABLE | STATX_ATTR_APPEND;
+  // STATX_ATTR_IMMUTABLE and STATX_ATTR_APPEND, which not every C library names.
+  constexpr unsigned fixed = 0x10U | 0x20U;
   struct statvfs mount {};
   struct statx directory {};
   return ::statvfs(paths::storage, &mount) == 0 && (mount.f_flag & ST_RDONLY) == 0 &&

@@ -48,14 +48,24 @@ std::set<std::string> unlinked_downloads() {
   return names;
 }
 
+/// The newest of the versions that `back` accepts; one that is withdrawn only where there is no
+/// other.
+std::string copy_to_keep(const device& now, const std::set<std::string>& versions) {
+  std::string kept;
+  std::string withdrawn;
+  for (const std::string& version : downloads_to_go_back_to(now)) {  // the newest comes last
+    if (!versions.contains(version)) continue;
+    (now.withdrawn && now.withdrawn->contains(version) ? withdrawn : kept) = version;
+  }
+  return kept.empty() ? withdrawn : kept;
+}
+
 }  // namespace
 
 outcome prune() {
+  const device now = read_device();
   std::set<std::string> superfluous = unlinked_downloads();
-  std::string kept;
-  for (const std::string& version : downloads_to_go_back_to(read_device()))
-    if (superfluous.contains(version)) kept = version;  // the newest one comes last
-  superfluous.erase(kept);
+  superfluous.erase(copy_to_keep(now, superfluous));
 
   outcome end = outcome::done;
   for (const std::string& version : superfluous) {

@@ -1,4 +1,5 @@
 #include <fcntl.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -73,11 +74,17 @@ faults faults_of_download(const device& now, const std::string& path, const cand
   return found;
 }
 
+/// Has two entries change places. Not every C library has renameat2(2).
+bool exchange(const char* one, const char* other) {
+  constexpr unsigned exchange_flag = 2;
+  return ::syscall(SYS_renameat2, AT_FDCWD, one, AT_FDCWD, other, exchange_flag) == 0;
+}
+
 /// Gives the download its name in one step; where a damaged one has it, the two change places.
 std::optional<refusal> name_download(const std::string& path) {
   if (!is_there(path)) {
     check(::rename(new_download, path.c_str()) == 0, path);
-  } else if (::renameat2(AT_FDCWD, new_download, AT_FDCWD, path.c_str(), RENAME_EXCHANGE) != 0) {
+  } else if (!exchange(new_download, path.c_str())) {
     check(errno == EINVAL || errno == ENOSYS, path);
     return refusal{outcome::failed,
                    {fault("%s is damaged, and this file system cannot replace it in one step",
