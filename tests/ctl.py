@@ -181,7 +181,7 @@ ADD = "kestrelctl publish 2026b.1.0 /tmp/fetched"
      "chmod 644 $B/icutz/icutz44l.dat; kestrel"),
     ("chmod 700 tz", "not everyone can read /var/db/timezone/tz: chmod a+rX it", "chmod a+rX tz"),
     ("chmod 700 $B", "not everyone can read $B: chmod a+rX it", "chmod a+rX $B"),
-    ("rm $B/icutz/icutz44l.dat", "icutz44l.dat is missing or no file: publish 2026b.1.0 again", ADD),
+    ("rm $B/icutz/icutz44l.dat", "icutz44l.dat is missing or no file: publish 2026b.1.0", ADD),
     ("rm -r $B/icutz; : >$B/icutz", "icutz44l.dat is missing or no file: publish", ADD),
     ("mv $B/icutz/icutz44{l,b}.dat", "has 44l: start a run of kestrel, and remove /var/db/timezone/"
      "tz_latest", "kestrel; rm tz_latest"),
