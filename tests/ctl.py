@@ -75,6 +75,9 @@ def publish(*releases):
         assert ctl(f"publish {release}.1.0 DIR") == (f"{release}.1.0 is active\n", 0)
 
 
+STRICTLY = ["sh", "-c", 'umask 077; exec "$0" "$@"']
+
+
 def well():
     before = found()
     status = ctl("status")
@@ -84,8 +87,10 @@ def well():
 
 def test_the_life_of_a_device():
     assert well() is True
-    publish("2026b", "2026c")
-    assert ctl("publish 2026c.1.0 DIR") == ("2026c.1.0 is active\n", 0)
+    publish("2026b")
+    fetch("2026c")
+    for before in (STRICTLY, []):
+        assert ctl("publish 2026c.1.0 DIR", *before) == ("2026c.1.0 is active\n", 0)
     for path, (sign, _, mode, _) in found().items():
         assert "/tz/" not in path or mode == {"/": 0o755, "=": 0o644, ">": 0o777}[sign], path
     assert ctl("status") == (
@@ -180,6 +185,10 @@ ADD = "kestrelctl publish 2026b.1.0 /tmp/fetched"
     ("chmod 600 $B/icutz/icutz44l.dat", "not everyone can read $B/icutz/icutz44l.dat: chmod a+rX",
      "chmod 644 $B/icutz/icutz44l.dat; kestrel"),
     ("chmod 700 tz", "not everyone can read /var/db/timezone/tz: chmod a+rX it", "chmod a+rX tz"),
+    ("chmod 700 $B/zoneinfo", "not everyone can read $B/zoneinfo: ", "chmod a+rX $B/zoneinfo"),
+    ("chmod 700 $B/icutz", "not everyone can read $B/icutz: ", "chmod a+rX $B/icutz"),
+    ("chmod 711 $B/zoneinfo/Asia", "not everyone can read $B/zoneinfo/Asia: chmod 755 it",
+     "chmod 755 $B/zoneinfo/Asia"),
     ("chmod 700 $B", "not everyone can read $B: chmod a+rX it", "chmod a+rX $B"),
     ("rm $B/icutz/icutz44l.dat", "icutz44l.dat is missing or no file: publish 2026b.1.0", ADD),
     ("rm -r $B/icutz; : >$B/icutz", "icutz44l.dat is missing or no file: publish", ADD),
@@ -284,7 +293,7 @@ def test_replacement():
 def test_publishing_in_place():
     fetch("2026b", STORAGE / "tz/2026b.1.0")
     sh("chmod -R go= tz/2026b.1.0")
-    there = ctl("publish 2026b.1.0 /var/db/timezone/tz/2026b.1.0")
+    there = ctl("publish 2026b.1.0 /var/db/timezone/tz/2026b.1.0", *STRICTLY)
     assert there == ("2026b.1.0 is active\n", 0) and well() is True
     fetch("2026c", STORAGE / "tz/2026d.1.0")
     assert ctl("publish 2026d.1.0 /var/db/timezone/tz/2026d.1.0")[1] == 4
