@@ -197,7 +197,8 @@ ADD = "kestrelctl publish 2026b.1.0 /tmp/fetched"
     ("rm -r $B", "$B is missing: start a run of kestrel, and remove /var/db/timezone/tz_latest",
      "kestrel; rm tz_latest"),
     ("rm -r $B; : >$B", "$B is missing: start a run of kestrel, and", "kestrel; rm tz_latest"),
-    ("rm -r tz", "/var/db/timezone/tz/ is missing: mkdir -p it", "mkdir tz; kestrel; rm tz_latest"),
+    ("rm -r tz", "timezone/tz/ is missing or no directory: make it one",
+     "mkdir tz; kestrel; rm tz_latest"),
     ("ln -sf ../+VERSION $B/zoneinfo/Asia/Tokyo", "Asia/Tokyo is not whole: publish", ADD),
     ("ln -sfn Etc $B/zoneinfo/Japan", "zoneinfo/Japan is missing: publish", ADD),
     ("mv $B/icutz /tmp/out; ln -s /tmp/out $B/icutz", "icutz is a link that leads out of the", ADD),
@@ -221,6 +222,11 @@ ADD = "kestrelctl publish 2026b.1.0 /tmp/fetched"
     ("ln -sfn $PWD/tz/2026c tz_latest", "2026c, the newest download, is missing", "rm tz_latest"),
     ("mkdir -p tz/2026c/icutz; : >tz/2026c/icutz/icutz44b.dat; ln -sfn $PWD/tz/2026c tz_latest",
      "2026c has schema 44b, and the system copy has 44l: remove", "rm tz_latest"),
+    ("cp -r $B tz/x; ln -sfn $PWD/tz/x/zoneinfo zoneinfo; ln -sfn $PWD/tz/x/icutz icutz",
+     "/var/db/timezone/tz/x has a name that is no version: start a run of kestrel", "kestrel"),
+    ("ln -sfn /usr/share /usr/share/zoneinfo", "zoneinfo does not lead to /var/db/timezone/zoneinfo"
+     ": ln -sfn /var/db/timezone/zoneinfo /usr/share/zoneinfo",
+     "ln -sfn /var/db/timezone/zoneinfo /usr/share/zoneinfo"),
     ("rm localtime", "localtime is missing: kestrelctl zone NAME", "kestrelctl zone Asia/Tokyo"),
     ("rm localtime; mkdir localtime", "localtime is no link: remove it, and kestrelctl zone NAME",
      "rmdir localtime; kestrelctl zone Asia/Tokyo"),
@@ -422,12 +428,90 @@ def test_a_download_that_waits():
 
 
 @pytest.mark.parametrize("line", ["publish 2026b.1.0 DIR", "back", "prune", "zone Etc/UTC"])
-@pytest.mark.parametrize("opened", ["chmod g+w .", "chmod o+w tz", pytest.param(
-    "chown 1234 tz", marks=several_users)])
-def test_unsafe_storage(line, opened):
+@pytest.mark.parametrize("opened, reason", [
+    ("chmod g+w .", "others than its owner can write /var/db/timezone/: chmod go-w it"),
+    ("chmod o+w tz", "others than its owner can write /var/db/timezone/tz/: chmod go-w it"),
+    pytest.param("chown 1234 tz", "/var/db/timezone/tz/ has another owner than /var/db/timezone/: "
+                 "chown it", marks=several_users)])
+def test_unsafe_storage(line, opened, reason):
     sh(opened)
     before = found()
-    assert ctl(line)[1] == 1 and found() == before
+    assert ctl(line) == (f"kestrelctl: {reason}\n", 1) and found() == before
+
+
+# What is as it should be already is not made again, so that it needs no room.
+def test_nothing_to_change():
+    publish("2026b")
+    before = found()
+    for line in ("publish 2026b.1.0 DIR", "back 2026b.1.0", "zone Asia/Tokyo", "prune"):
+        assert ctl(line)[1] == 0 and found() == before, line
+
+
+# Where the disk or the system fails to read, prune takes no copy for a bad one.
+def test_prune_that_cannot_read():
+    publish("2026b", "2026c", "2026d")
+    ctl("prune", *TRACER)
+    seen = Counter(re.findall(r"^(openat|getdents64|read)\(", TRACE.read_text(), re.M))
+    for name, times in seen.items():
+        for when in range(1, times + 1, 1 + times // 20):
+            error = "EIO" if name != "openat" else "EMFILE"
+            said = ctl("prune", *TRACER, "-e", f"inject={name}:error={error}:when={when}")
+            if "cannot open shared object" in said[0] or said[1] == 127:
+                continue  # it was the loader that failed
+            kept = os.listdir(STORAGE / "tz")
+            assert "2026c.1.0" in kept and (said[1] or "2026b.1.0" not in kept), (name, when, said)
+            shutil.copytree(STORAGE / "tz/2026c.1.0", STORAGE / "tz/2026b.1.0", dirs_exist_ok=True)
+            (STORAGE / "tz/2026b.1.0/zoneinfo/+VERSION").write_text("2026b")
+            (STORAGE / "tz/2026b.1.0/zoneinfo/tzdata.zi").write_text("# version 2026b")
+
+
+# A copy that not everyone can read is neither published nor gone back to.
+@pytest.mark.parametrize("closed", [".", "zoneinfo", "icutz", "zoneinfo/Etc"])
+def test_closed_copies(closed):
+    fetch("2026b", STORAGE / "tz/2026b.1.0")
+    os.chmod(STORAGE / "tz/2026b.1.0" / closed, 0o700)
+    assert ctl("publish 2026b.1.0 /var/db/timezone/tz/2026b.1.0") == ("2026b.1.0 is active\n", 0)
+    assert well() is True
+    publish("2026c")
+    os.chmod(STORAGE / "tz/2026b.1.0" / closed, 0o700)
+    assert ctl("back 2026b.1.0")[1] == 4 and "downloads: 2026c.1.0\n" in ctl("status")[0]
+
+
+# What others can change is copied anew, and only with the same content.
+def test_copies_that_others_can_change():
+    publish("2026b")
+    os.chmod(STORAGE / "tz/2026b.1.0/zoneinfo/Etc/UTC", 0o666)
+    fetch("2026b")
+    (FETCHED / "zoneinfo/more").write_text("more")
+    said = ctl("publish 2026b.1.0 DIR")
+    assert said[1] == 4 and "has other content" in said[0]
+    publish("2026b")
+    assert os.stat(STORAGE / "tz/2026b.1.0/zoneinfo/Etc/UTC").st_mode & 0o777 == 0o644
+
+
+# A link stays where its replacement fails, whatever the reason.
+def test_no_link_is_lost():
+    publish("2026b", "2026c")
+    for line in ("zone Etc/UTC", "back 2026b.1.0", "back"):
+        for error in ("rename:error=EIO", "symlink:error=EROFS", "symlink:error=EIO:when=2+"):
+            done = ctl(line, *TRACER, "-e", f"inject={error}")[1] == 0
+            assert (STORAGE / "localtime").exists() and (STORAGE / "zoneinfo").exists(), line
+            assert done or (STORAGE / "icutz").exists() and (STORAGE / "tz_latest").exists(), line
+
+
+# The first run has to go back, the second one switches.
+def test_publishing_beside_a_copy_of_another_schema():
+    fetch("2099z", STORAGE / "tz/2099z.1.0")
+    sh("cd tz/2099z.1.0; mv icutz/icutz44{l,b}.dat; ln -sfn $PWD/zoneinfo $PWD/icutz ../..")
+    fetch("2026b")
+    said = ctl("publish 2026b.1.0 DIR")
+    assert said[0].startswith("2026b.1.0 is active\n") and said[1] == 0
+
+
+def test_many_faults():
+    sh("for i in {1..30}; do : >/tmp/fetched/zoneinfo/empty$i; done")
+    said = ctl("publish 2026b.1.0 DIR")
+    assert said[0].count("\n") == 21 and said[0].endswith("kestrelctl: 10 more lines like these\n")
 
 
 # The data is on the disk before its name is, and the name before the run.
@@ -437,6 +521,11 @@ def test_order_of_writes():
     order = re.findall(r'syncfs|execve(?=.*kestrel")|(?<=timezone/)\S+(?="\) = 0)', done)
     assert order == ["syncfs", "tz/2026b.1.0", "syncfs", "tz_latest", "syncfs", "execve",
                      "zoneinfo", "icutz"]
+    publish("2026c")
+    ctl("back 2026b.1.0", *TRACER)
+    order = re.findall(r'^(f?sync)|^rename.*(?<=timezone/)(\S+)"\) = 0', TRACE.read_text(), re.M)
+    assert [sync or name for sync, name in order] == ["fsync", "withdrawn", "fsync", "tz_latest",
+                                                      "zoneinfo", "icutz", "sync"]
 
 
 def test_the_run():
@@ -463,7 +552,8 @@ def test_no_zone(name):
 
 
 def test_usage():
-    for line in ("", "stat", "status x", "publish 2026b.1.0", "back a b", "zone", "back x"):
+    for line in ("", "stat", "status x", "publish 2026b.1.0", "back a b", "zone", "zone a b",
+                 "back x"):
         said = ctl(line)
         assert said[1] == 2 and said[0].startswith("kestrelctl: "), line
     assert ctl("--help")[1] == ctl("--version")[1] == 0

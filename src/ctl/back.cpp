@@ -3,6 +3,7 @@
 #include "ctl/commands.h"
 #include "ctl/device.h"
 #include "ctl/diagnosis.h"
+#include "ctl/files.h"
 #include "ctl/print.h"
 #include "ctl/withdrawn.h"
 #include "ctl/workplace.h"
@@ -18,7 +19,7 @@ namespace {
 /// it leaves, and without `version`.
 version_set withdrawn_after(const device& now, const std::string& version) {
   const vela_version target = version_of(version.empty() ? now.system_version : version);
-  version_set withdrawn = *now.withdrawn;
+  version_set withdrawn = now.withdrawn.value_or(version_set());
   const bool is_download_active = !now.view.current_path.value_or("").empty();
   if (is_download_active && version_of(now.active_version) > target)
     withdrawn.insert(now.active_version);
@@ -29,6 +30,7 @@ version_set withdrawn_after(const device& now, const std::string& version) {
 
 /// The way back has priority: where the list cannot be written, it goes on.
 void withdraw(const device& now, const version_set& withdrawn) {
+  if (!now.withdrawn) return complain(fault("%s cannot be read", {withdrawn_list}, "remove it"));
   if (withdrawn == *now.withdrawn) return;
   try {
     write_withdrawn(withdrawn);
@@ -59,18 +61,20 @@ void name_newest(const std::string& path) {
 outcome go_back(const std::string& version) {
   const device now = read_device();
   const std::string path = version.empty() ? "" : path_of(version);
+  if (is_blind(now)) return refuse({outcome::failed, faults_of(now)});
   if (const faults found = faults_of_link_places(now); !found.empty())
     return refuse({outcome::failed, found});
   if (const faults found = faults_of_way_back(now, version); !found.empty())
     return refuse({outcome::unusable, found});
   // Both new links are staged before anything is changed: what fails then changes nothing.
-  if (!is_active(now, path)) {
+  const bool is_done = is_active(now, path) && !is_there(paths::new_icu_link);
+  if (!is_done) {
     stage_link(zoneinfo_directory(path), paths::zoneinfo_link, paths::new_zoneinfo_link);
     if (!path.empty()) stage_link(icu_directory(path), paths::icu_link, paths::new_icu_link);
   }
   withdraw(now, withdrawn_after(now, version));
   name_newest(path);  // before the rest, so that no run in between undoes that
-  if (!is_active(now, path)) vela_dataset(path).activate();
+  if (!is_done) vela_dataset(path).activate();
   sync_file_system(paths::storage);
 
   const device then = read_device();

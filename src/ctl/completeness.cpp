@@ -1,15 +1,20 @@
 #include "ctl/completeness.h"
 
+#include <sys/stat.h>
+
+#include <cerrno>
 #include <filesystem>
+#include <map>
 #include <optional>
+#include <sstream>
 #include <system_error>
+#include <utility>
 
 #include "ctl/bundle.h"
 #include "ctl/files.h"
 #include "ctl/tzif.h"
 #include "dataset/vela_icu.h"
 #include "dataset/vela_zoneinfo.h"
-#include "fs/file.h"
 #include "paths.h"
 
 namespace {
@@ -23,6 +28,8 @@ struct inspection {
   std::filesystem::path shown;  // how the lines call `top`
   std::string schema;           // the system copy's
   faults found = {};
+  // Whether the end of a link, of a zone's name or not, is good: many lead to the same.
+  std::map<std::pair<std::string, bool>, bool> ends = {};
 
   [[nodiscard]] std::string name_of(const std::filesystem::path& inside) const {
     return shown / inside;
@@ -51,10 +58,13 @@ fault closed_to_some(const std::string& path, bool is_directory) {
 }
 
 /// The names of zones begin with capital letters, those of tables do not.
-bool is_zone_or_table(const std::string& content, const std::filesystem::path& name) {
-  const char first = name.filename().string().front();
-  const bool is_zone = content.starts_with("TZif") || (first >= 'A' && first <= 'Z');
-  if (is_zone) return is_whole_zone(content);
+bool has_zone_name(const std::filesystem::path& entry) {
+  const char first = entry.filename().string().front();
+  return first >= 'A' && first <= 'Z';
+}
+
+bool is_zone_or_table(const std::string& content, bool is_zone) {
+  if (is_zone || content.starts_with("TZif")) return is_whole_zone(content);
   return !content.empty() && content.find('\0') == std::string::npos;
 }
 
@@ -76,24 +86,27 @@ void inspect_link(inspection& copy, const std::filesystem::path& inside,
                   const std::filesystem::path& twin) {
   if (link_target(copy.top / inside) == local_zone) return;
   const auto end = end_of(copy.top, inside, twin);
-  std::error_code error;
   if (!end) {
     copy.found.push_back(
         fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
-  } else if (!std::filesystem::is_directory(*end, error) &&
-             !is_zone_or_table(read_file(*end).value_or(""), inside)) {
-    copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
+    return;
   }
+  const bool is_zone = has_zone_name(inside);
+  const auto [known, is_new] = copy.ends.try_emplace({*end, is_zone}, true);
+  if (is_new && !leads_to_directory(*end))
+    known->second = is_zone_or_table(read_file(*end).value_or(""), is_zone);
+  if (!known->second) copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
 }
 
 /// Whether the directory `name` of the copy is one, inside of it, so that it can be looked at.
 bool inspect_top(inspection& copy, const std::filesystem::path& name) {
-  std::error_code error;
-  if (!std::filesystem::is_directory(copy.top / name, error)) {
+  if (!leads_to_directory(copy.top / name)) {
     copy.found.push_back(fault("%s is missing or no directory", {copy.name_of(name)}));
   } else if (!resolve_inside(copy.top, name)) {
     copy.found.push_back(
         fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(name)}));
+  } else if (!is_open_to_all(std::filesystem::status(copy.top / name))) {
+    copy.found.push_back(closed_to_some(copy.name_of(name), true));
   } else {
     return true;
   }
@@ -113,7 +126,7 @@ void inspect_tree(inspection& copy) {
     } else if (!is_open_to_all(status)) {
       copy.found.push_back(closed_to_some(copy.name_of(inside), is_directory(status)));
     } else if (is_regular_file(status) &&
-               !is_zone_or_table(read_file(entry.path()).value_or(""), inside)) {
+               !is_zone_or_table(read_file(entry.path()).value_or(""), has_zone_name(inside))) {
       copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
     }
     return true;
@@ -126,13 +139,14 @@ void inspect_missing(inspection& copy) {
   const std::filesystem::path system = paths::system_zoneinfo;
   walk(system, "", [&](const directory_entry& theirs, const auto& name) {
     if (name == "+VERSION" || (theirs.is_symlink() && !resolve_inside(system, name))) return true;
-    std::error_code error;
     const std::filesystem::path ours = copy.top / copy.tree / name;
-    const bool is_same_kind =
-        std::filesystem::is_directory(ours, error) == theirs.is_directory(error);
-    if (is_same_kind && std::filesystem::exists(ours, error)) return true;
-    const bool is_told = error == std::errc::permission_denied ||
-                         (is_there(ours) && !resolve_inside(copy.top, copy.tree / name));
+    struct stat found {};
+    const bool is_missing = ::stat(ours.c_str(), &found) != 0;
+    check(!is_missing || !is_hard(errno), ours);
+    const bool is_closed = is_missing && errno == EACCES;
+    if (!is_missing && S_ISDIR(found.st_mode) == theirs.is_directory()) return true;
+    const bool is_told =
+        is_closed || (is_there(ours) && !resolve_inside(copy.top, copy.tree / name));
     if (!is_told) copy.found.push_back(fault("%s is missing", {copy.name_of(copy.tree / name)}));
     return false;
   });
@@ -149,9 +163,12 @@ void inspect_release(inspection& copy, const std::string& version) {
     }
   };
   const std::filesystem::path tree = copy.top / copy.tree;
-  if (read_file(tree / "+VERSION")) {
-    compare("+VERSION", fs::read_first_word((tree / "+VERSION").c_str()));
-  } else if (!is_there(tree / "+VERSION")) {
+  const std::string file = tree / "+VERSION";
+  if (is_there(file)) {
+    std::string word;
+    std::istringstream(read_file(file).value_or("")) >> word;
+    compare("+VERSION", word);
+  } else {
     copy.found.push_back(fault("%s is missing", {copy.name_of(copy.tree / "+VERSION")}));
   }
   if (const auto source = read_file(tree / "tzdata.zi"); source && source->starts_with(head))
@@ -159,7 +176,7 @@ void inspect_release(inspection& copy, const std::string& version) {
 }
 
 void inspect_schema(inspection& copy) {
-  const std::string declared = vela_icu(copy.top).get_schema();
+  const std::string declared = schema_of(copy.top);
   const std::string file = "icutz/icutz" + copy.schema + ".dat";
   if (declared.empty()) {
     copy.found.push_back(fault("%s is missing or no file", {copy.name_of(file)}));
@@ -209,7 +226,8 @@ void inspect_bundles(inspection& copy) {
 
 faults faults_of_copy(const std::string& path, const std::string& version,
                       const std::string& shown) {
-  inspection copy{path, "zoneinfo", shown, vela_icu().get_schema()};
+  inspection copy{path, "zoneinfo", shown, schema_of("")};
+  if (!path.empty() && !inspect_top(copy, "")) return copy.found;
   if (path.empty()) {
     copy = {paths::system_zoneinfo, "", paths::system_zoneinfo, copy.schema};
     inspect_tree(copy);
@@ -220,6 +238,10 @@ faults faults_of_copy(const std::string& path, const std::string& version,
   }
   inspect_release(copy, version);
   return copy.found;
+}
+
+std::string schema_of(const std::string& path) {
+  return read_or_throw(path, [&path] { return vela_icu(path).get_schema(); });
 }
 
 bool has_zone(const std::string& path, const std::string& name) {

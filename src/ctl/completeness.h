@@ -23,5 +23,9 @@
 /// may.
 [[nodiscard]] bool has_zone(const std::string& path, const std::string& name);
 
+/// The schema of the copy at `path`; empty where it has none. Throws std::system_error where the
+/// disk or the system fails.
+[[nodiscard]] std::string schema_of(const std::string& path);
+
 /// The release of a version: 2026b for 2026b.1.0.
 [[nodiscard]] std::string release_of(const std::string& version);

@@ -72,7 +72,7 @@ void copy_file(const place& from, const place& to, const std::string& name) {
   const fs::descriptor source(::openat(from.directory, name.c_str(), file_flags));
   struct stat found {};
   check(source.is_open() && ::fstat(source.get(), &found) == 0, path);
-  if (!S_ISREG(found.st_mode)) errno = EINVAL;
+  errno = EINVAL;  // of an entry that was a file when it was looked at
   check(S_ISREG(found.st_mode), path);
   const fs::descriptor copy(::openat(
       to.directory, name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, file_mode));
@@ -101,8 +101,8 @@ void copy_link(const place& from, const place& to, const std::string& name) {
 /// The kind of an entry, as in st_mode; 0 where there is none.
 mode_t kind_of(const place& from, const std::string& name) {
   struct stat found {};
-  const bool is_there = ::fstatat(from.directory, name.c_str(), &found, AT_SYMLINK_NOFOLLOW) == 0;
-  check(is_there || errno == ENOENT, from / name);
+  const int failed = ::fstatat(from.directory, name.c_str(), &found, AT_SYMLINK_NOFOLLOW);
+  check(failed == 0 || errno == ENOENT, from / name);
   return found.st_mode & S_IFMT;
 }
 

@@ -23,12 +23,6 @@ constexpr const char* repair = "repair the image";
 constexpr const char* start = "start a run of kestrel";
 constexpr const char* set_zone = "kestrelctl zone NAME";
 
-/// Whether `path` is a directory, links followed.
-bool leads_to_directory(const std::string& path) {
-  std::error_code error;
-  return std::filesystem::is_directory(path, error);
-}
-
 bool is_other_than_link(const char* path) {
   return is_there(path) && link_target(path).empty();
 }
@@ -65,8 +59,10 @@ std::vector<std::string> places_of_copies(const device& now) {
 
 faults faults_of_places(const device& now) {
   faults found;
-  for (const std::string place : {paths::storage, paths::downloads})
-    if (!is_there(place)) found.push_back(fault("%s is missing", {place}, "mkdir -p it"));
+  for (const std::string place : {paths::storage, paths::downloads}) {
+    if (!leads_to_directory(place))
+      found.push_back(fault("%s is missing or no directory", {place}, "make it one"));
+  }
   for (const std::string& place : places_of_copies(now)) {
     const std::string closed = closed_part(place);
     const fault one("not everyone can read %s", {closed}, "chmod a+rX it");
@@ -74,6 +70,11 @@ faults faults_of_places(const device& now) {
     if (!closed.empty() && std::ranges::none_of(found, is_same)) found.push_back(one);
   }
   return found;
+}
+
+faults faults_of_list(const device& now) {
+  if (now.withdrawn) return {};
+  return {fault("%s cannot be read", {withdrawn_list}, "remove it")};
 }
 
 faults faults_of_system(const device& now) {
@@ -97,14 +98,15 @@ faults faults_of_system(const device& now) {
 
 /// Both schemas, or the versions, where a run does not keep the copy at `path`.
 faults faults_of_fitness(const device& now, const std::string& path, const vela_dataset& copy) {
-  const std::string schema = vela_icu(path).get_schema();
+  const std::string schema = schema_of(path);
   if (!now.view.system || may_stay(copy, *now.view.system)) return {};
   const std::string file = path + "/icutz/icutz" + now.system_schema + ".dat";
   if (schema.empty() && is_there(file) && !closed_part(file).empty())
     return {fault("not everyone can read %s", {closed_part(file)}, "chmod a+rX it")};
-  if (schema.empty())
+  if (schema.empty()) {
     return {fault("%s is missing or no file", {file},
                   "publish " + path.substr(path.rfind('/') + 1) + " again, from good data")};
+  }
   if (schema != now.system_schema) {
     return {
         fault("%s has schema %s, and the system copy has %s", {path, schema, now.system_schema})};
@@ -234,8 +236,8 @@ faults faults_of(const device& now) {
   faults found = faults_of_places(now);
   if (is_blind(now)) return found;
   for (const auto& subject :
-       {faults_of_system, faults_of_link_places, faults_of_active_links, faults_of_active,
-        faults_of_latest, faults_of_remains, faults_of_zone})
+       {faults_of_system, faults_of_link_places, faults_of_list, faults_of_active_links,
+        faults_of_active, faults_of_latest, faults_of_remains, faults_of_zone})
     append(found, subject(now));
   append(found, faults_of_next_run(now, found.empty()));
   append(found, faults_of_entrance("/etc/localtime", paths::localtime_link));
@@ -262,7 +264,14 @@ faults faults_of_link_places(const device& now) {
     found.push_back(fault("%s is no link", {icutz}, "remove it, and " + way_back_to(now)));
   if (is_other_than_link(paths::latest_link))
     found.push_back(fault("%s is no link", {paths::latest_link}, "remove it"));
-  if (!now.withdrawn) found.push_back(fault("%s cannot be read", {withdrawn_list}, "remove it"));
+  return found;
+}
+
+faults faults_of_ground(const device& now) {
+  faults found = faults_of_places(now);
+  append(found, faults_of_system(now));
+  append(found, faults_of_link_places(now));
+  append(found, faults_of_list(now));
   return found;
 }
 
@@ -273,8 +282,11 @@ faults faults_of_way_back(const device& now, const std::string& version) {
   faults found;
   if (!path.empty()) {
     if (!leads_to_directory(path)) return {fault("%s is missing", {path})};
-    found = faults_of_fitness(now, path, vela_dataset(path));
+    const vela_dataset copy = read_or_throw(path, [&path] { return vela_dataset(path); });
+    found = faults_of_fitness(now, path, copy);
     if (found.empty()) found = faults_of_copy(path, version, path);
+    if (const std::string closed = closed_part(path); found.empty() && !closed.empty())
+      found.push_back(fault("not everyone can read %s", {closed}, "chmod a+rX it"));
   }
   if (found.empty() && !now.zone.empty() && !has_zone(path, now.zone))
     found.push_back(fault("%s has not the local zone, %s", {zoneinfo_directory(path), now.zone}));
@@ -282,15 +294,21 @@ faults faults_of_way_back(const device& now, const std::string& version) {
   return found;
 }
 
-std::vector<std::string> downloads_to_go_back_to(const device& now) {
-  std::vector<std::string> versions;
+ways_back find_ways_back(const device& now) {
+  ways_back found;
   for (const auto& entry : std::filesystem::directory_iterator(paths::downloads)) {
     const std::string version = entry.path().filename();
-    if (version_of(version) != vela_version() && faults_of_way_back(now, version).empty())
-      versions.push_back(version);
+    if (version_of(version) == vela_version()) continue;
+    try {
+      if (faults_of_way_back(now, version).empty()) found.accepted.push_back(version);
+    } catch (const std::system_error& failure) {
+      found.unread.insert(version);
+      found.reasons.push_back(
+          fault("%s cannot be read: %s", {entry.path(), failure.what()}, "remove it"));
+    }
   }
-  std::ranges::sort(versions, [](const std::string& one, const std::string& other) {
+  std::ranges::sort(found.accepted, [](const std::string& one, const std::string& other) {
     return version_of(one) < version_of(other);
   });
-  return versions;
+  return found;
 }

@@ -4,22 +4,19 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
-#include <cerrno>
 #include <cstddef>
 #include <deque>
 #include <system_error>
 
 #include "fs/descriptor.h"
 
-namespace {
-
-/// Whether it is the disk or the system that fails, and not the entry that is another one.
 bool is_hard(int error) {
-  return error == EIO || error == EMFILE || error == ENFILE || error == ENOMEM;
+  constexpr std::array soft = {0,      ENOENT, ENOTDIR, EACCES, EPERM, ELOOP, ENAMETOOLONG,
+                               EINVAL, ENXIO,  ENODEV,  EISDIR, ERANGE};
+  return std::ranges::find(soft, error) == soft.end();
 }
-
-}  // namespace
 
 void check(bool done, const std::string& path) {
   if (!done) throw std::system_error(errno, std::generic_category(), path);
@@ -28,7 +25,8 @@ void check(bool done, const std::string& path) {
 std::optional<std::string> read_file(const std::string& path) {
   constexpr off_t limit = 2L << 20;
   struct stat found {};
-  if (::stat(path.c_str(), &found) != 0 || !S_ISREG(found.st_mode)) return {};
+  check(::stat(path.c_str(), &found) == 0 || !is_hard(errno), path);
+  if (!S_ISREG(found.st_mode)) return {};
   // O_NONBLOCK and the second look are for an entry that changes in between.
   const fs::descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
   check(file.is_open() || !is_hard(errno), path);
@@ -47,12 +45,24 @@ std::optional<std::string> read_file(const std::string& path) {
 
 std::string link_target(const std::string& path) {
   std::error_code error;
-  return std::filesystem::read_symlink(path, error);
+  const std::filesystem::path target = std::filesystem::read_symlink(path, error);
+  errno = error.value();
+  check(!is_hard(errno), path);
+  return target;
 }
 
 bool is_there(const std::string& path) {
   struct stat found {};
-  return ::lstat(path.c_str(), &found) == 0;
+  const bool found_it = ::lstat(path.c_str(), &found) == 0;
+  check(found_it || !is_hard(errno), path);
+  return found_it;
+}
+
+bool leads_to_directory(const std::string& path) {
+  struct stat found {};
+  const bool found_it = ::stat(path.c_str(), &found) == 0;
+  check(found_it || !is_hard(errno), path);
+  return found_it && S_ISDIR(found.st_mode);
 }
 
 std::string closed_part(const std::string& path) {

@@ -4,6 +4,8 @@
 #include <sys/stat.h>
 #include <sys/statvfs.h>
 
+#include <cerrno>
+
 #include "ctl/files.h"
 #include "dataset/vela_icu.h"
 #include "paths.h"
@@ -14,12 +16,16 @@ namespace {
 
 /// What `read` returns; nothing where it throws.
 template <typename Read>
-auto attempt(Read read) -> std::optional<decltype(read())> {
+auto attempt(run_view& view, Read read) -> std::optional<decltype(read())> {
+  errno = 0;
+  std::optional<decltype(read())> result;
   try {
-    return read();
+    result = read();
   } catch (...) {
-    return {};
+    result.reset();
   }
+  view.is_uncertain |= is_hard(errno);
+  return result;
 }
 
 bool is_real_directory(const char* path) {
@@ -57,12 +63,12 @@ std::optional<std::string> chosen_path(const run_view& view) {
 
 run_view read_as_a_run() {
   run_view view;
-  view.system = attempt([] { return vela_dataset(); });
-  view.latest_path = attempt(latest_dataset_path);
-  view.current_path = attempt(current_dataset_path);
-  view.current = attempt([&view] { return vela_dataset(view.current_path.value_or("")); });
+  view.system = attempt(view, [] { return vela_dataset(); });
+  view.latest_path = attempt(view, latest_dataset_path);
+  view.current_path = attempt(view, current_dataset_path);
+  view.current = attempt(view, [&view] { return vela_dataset(view.current_path.value_or("")); });
   if (view.latest_path && !view.latest_path->empty())
-    view.latest = attempt([&view] { return vela_dataset(*view.latest_path); });
+    view.latest = attempt(view, [&view] { return vela_dataset(*view.latest_path); });
   view.can_change_storage = can_change_storage();
   view.is_zoneinfo_directory = is_real_directory(paths::zoneinfo_link);
   view.is_icutz_directory = is_real_directory(paths::icu_link);

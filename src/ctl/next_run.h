@@ -15,6 +15,9 @@ struct run_view {
 
   std::optional<std::string> current_path;  // absent where the zoneinfo link names no copy
 
+  // Whether the disk or the system failed to read some of it.
+  bool is_uncertain = false;
+
   // What decides whether the links can be changed.
   bool can_change_storage = false;
   bool is_zoneinfo_directory = false;

@@ -50,24 +50,36 @@ std::set<std::string> unlinked_downloads() {
 
 /// The newest of the versions that `back` accepts; one that is withdrawn only where there is no
 /// other.
-std::string copy_to_keep(const device& now, const std::set<std::string>& versions) {
+std::string copy_to_keep(const device& now, const ways_back& ways,
+                         const std::set<std::string>& versions) {
   std::string kept;
   std::string withdrawn;
-  for (const std::string& version : downloads_to_go_back_to(now)) {  // the newest comes last
+  for (const std::string& version : ways.accepted) {  // the newest comes last
     if (!versions.contains(version)) continue;
     (now.withdrawn && now.withdrawn->contains(version) ? withdrawn : kept) = version;
   }
   return kept.empty() ? withdrawn : kept;
 }
 
+/// Why nobody knows which copies are good.
+faults faults_of_judgement(const device& now) {
+  if (now.view.is_uncertain) return {fault("the device cannot be read", {}, "start again")};
+  return is_blind(now) || !faults_of_ground(now).empty() ? faults_of(now) : faults();
+}
+
 }  // namespace
 
 outcome prune() {
   const device now = read_device();
+  if (const faults found = faults_of_judgement(now); !found.empty())
+    return refuse({outcome::failed, found});
+  const ways_back ways = find_ways_back(now);
   std::set<std::string> superfluous = unlinked_downloads();
-  superfluous.erase(copy_to_keep(now, superfluous));
+  superfluous.erase(copy_to_keep(now, ways, superfluous));
+  for (const std::string& version : ways.unread) superfluous.erase(version);
+  complain_all(ways.reasons);
 
-  outcome end = outcome::done;
+  outcome end = ways.reasons.empty() ? outcome::done : outcome::failed;
   for (const std::string& version : superfluous) {
     try {
       std::filesystem::remove_all(path_of(version));

@@ -87,8 +87,8 @@ std::optional<refusal> name_download(const std::string& path) {
   } else if (!exchange(new_download, path.c_str())) {
     check(errno == EINVAL || errno == ENOSYS, path);
     return refusal{outcome::failed,
-                   {fault("%s is damaged, and this file system cannot replace it in one step",
-                          {path}, "publish the data under a higher version")}};
+                   {fault("this file system cannot replace %s in one step", {path},
+                          "publish the data under a higher version")}};
   }
   return {};
 }
@@ -104,29 +104,30 @@ std::optional<refusal> add_download(const device& now, const candidate& wanted) 
   return name_download(wanted.path);
 }
 
-/// Whether the download is at its path already, whole, and safe from other users. One that cannot
-/// be read is as good as none.
-bool is_in_place(const device& now, const candidate& wanted) {
+/// Whether a whole download is at the path already. One that cannot be read is as good as none.
+bool is_whole_there(const device& now, const candidate& wanted) {
   try {
     return is_there(wanted.path) && link_target(wanted.path).empty() &&
-           faults_of_download(now, wanted.path, wanted).empty() &&
-           faults_of_ownership(wanted.path).empty();
+           faults_of_download(now, wanted.path, wanted).empty();
   } catch (const std::system_error&) {
     return false;
   }
 }
 
-/// Sees to it that the download is at its path: it is there already, or it is copied there.
+/// Sees to it that the download is at its path. One that is there and whole stays, unless others
+/// can change it: a copy with the same content takes its place then.
 std::optional<refusal> place_download(const device& now, const candidate& wanted) {
-  std::error_code error;
-  if (!std::filesystem::is_directory(wanted.directory, error)) {
+  if (!leads_to_directory(wanted.directory)) {
     return refusal{outcome::unusable, {fault("%s is missing or no directory", {wanted.directory})}};
   }
-  if (!is_in_place(now, wanted)) return add_download(now, wanted);
-  if (are_same(wanted.directory, wanted.path)) return {};
-  return refusal{
-      outcome::unusable,
-      {fault("%s has other content", {wanted.path}, "publish this under a higher version")}};
+  if (!is_whole_there(now, wanted)) return add_download(now, wanted);
+  if (!are_same(wanted.directory, wanted.path)) {
+    return refusal{
+        outcome::unusable,
+        {fault("%s has other content", {wanted.path}, "publish this under a higher version")}};
+  }
+  if (!faults_of_ownership(wanted.path).empty()) return add_download(now, wanted);
+  return {};
 }
 
 /// Makes tz_latest name the download, unless it is the active one and a newer one waits. What is
@@ -182,10 +183,8 @@ outcome activate(const candidate& wanted) {
 outcome publish(const std::string& version, const std::string& directory) {
   const device now = read_device();
   const candidate wanted{version, directory};
-  if (!now.view.system || !faults_of_link_places(now).empty()) {
-    complain_all(faults_of(now));
-    return outcome::failed;
-  }
+  if (const faults found = faults_of_ground(now); !found.empty())
+    return refuse({outcome::failed, found});
   if (const auto no = judge_version(now, wanted)) return refuse(*no);
   if (const auto no = place_download(now, wanted)) return refuse(*no);
   name_for_runs(now, wanted);

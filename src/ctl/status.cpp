@@ -1,5 +1,3 @@
-#include <system_error>
-
 #include "ctl/commands.h"
 #include "ctl/device.h"
 #include "ctl/diagnosis.h"
@@ -38,10 +36,10 @@ outcome print_status() {
   print("zone", now.zone);
   print("last switch", last_switch());
   faults found;
-  try {
-    if (!is_blind(now)) print("downloads", joined(downloads_to_go_back_to(now)));
-  } catch (const std::system_error& failure) {
-    found.push_back(fault("the downloads cannot be read: %s", {failure.what()}));
+  if (!is_blind(now) && leads_to_directory(paths::downloads)) {
+    const ways_back ways = find_ways_back(now);
+    print("downloads", joined(ways.accepted));
+    found = ways.reasons;
   }
   print("withdrawn", joined(now.withdrawn.value_or(version_set())));
   append(found, faults_of(now));

@@ -67,6 +67,5 @@ bool is_whole_zone(std::string_view content) {
   std::string_view rest = content;
   if (!take_block(rest, 4)) return false;
   if (has_one_block) return rest.empty();
-  return take_block(rest, 8) && rest.size() > 1 && rest.starts_with('\n') &&
-         rest.find('\n', 1) == rest.size() - 1;
+  return take_block(rest, 8) && rest.starts_with('\n') && rest.find('\n', 1) == rest.size() - 1;
 }

@@ -11,12 +11,16 @@
 #include "paths.h"
 
 std::optional<version_set> read_withdrawn() {
-  const std::optional<std::string> content = read_file(withdrawn_list);
-  if (!content && is_there(withdrawn_list)) return {};
-  std::istringstream lines(content.value_or(""));
-  version_set versions;
-  for (std::string version; lines >> version;) versions.insert(version);
-  return versions;
+  try {
+    const std::optional<std::string> content = read_file(withdrawn_list);
+    if (!content && is_there(withdrawn_list)) return {};
+    std::istringstream lines(content.value_or(""));
+    version_set versions;
+    for (std::string version; lines >> version;) versions.insert(version);
+    return versions;
+  } catch (const std::system_error&) {
+    return {};
+  }
 }
 
 void write_withdrawn(const version_set& versions) {

@@ -13,6 +13,6 @@ using version_set = std::set<std::string>;
 /// read.
 [[nodiscard]] std::optional<version_set> read_withdrawn();
 
-/// Replaces the list in one step, on the disk as well when this returns. Where the set is empty,
-/// there is no list afterwards. Throws std::system_error; the old list stays then.
+/// Replaces the list in one step, on the disk as well when this returns; where the set is empty, it
+/// removes the list. Throws std::system_error; mostly, the old list stays then.
 void write_withdrawn(const version_set& versions);

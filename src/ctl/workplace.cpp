@@ -41,10 +41,9 @@ faults faults_of_storage() {
 }
 
 storage_lock::storage_lock()
-    : directory(::open(paths::downloads, O_RDONLY | O_DIRECTORY | O_CLOEXEC)) {
-  check(directory.is_open(), paths::downloads);
-  held = ::flock(directory.get(), LOCK_EX | LOCK_NB) == 0;
-  check(held || errno == EWOULDBLOCK, paths::downloads);
+    : directory(::open(paths::downloads, O_RDONLY | O_DIRECTORY | O_CLOEXEC)),
+      held(directory.is_open() && ::flock(directory.get(), LOCK_EX | LOCK_NB) == 0) {
+  check(held || (directory.is_open() && errno == EWOULDBLOCK), paths::downloads);
 }
 
 workshop::workshop() {
@@ -76,6 +75,7 @@ void replace_link(const std::string& target, const char* link, const char* stage
   if (fs::is_symlink_to(target.c_str(), link)) return;
   stage_link(target, link, staged);
   if (fs::replace_symlink(target.c_str(), link, staged)) return;
+  check(errno == EISDIR || errno == EEXIST || errno == ENOSPC || errno == EDQUOT, link);
   fs::remove(link);
   fs::create_symlink(target.c_str(), link);
 }

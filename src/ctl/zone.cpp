@@ -4,12 +4,14 @@
 #include "ctl/files.h"
 #include "ctl/print.h"
 #include "ctl/workplace.h"
+#include "dataset/vela_zoneinfo.h"
 #include "paths.h"
 
 outcome set_zone(const std::string& name) {
   const device now = read_device();
   const std::string localtime = paths::localtime_link;
-  if (!now.view.current_path || !has_zone(*now.view.current_path, name))
+  const std::string path = now.view.current_path.value_or("");
+  if (now.zoneinfo_target != zoneinfo_directory(path) || !has_zone(path, name))
     return refuse({outcome::unusable, {fault("%s is no whole zone of the active copy", {name})}});
   const std::string target = std::string(paths::zoneinfo_link) + "/" + name;
   if (const std::string closed = closed_part(target); !closed.empty()) {
