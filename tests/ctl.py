@@ -62,7 +62,9 @@ def ctl(line, *before):
     """Runs kestrelctl, by the commands before it; gives all that it prints, and its status."""
     command = [*before, "kestrelctl", *line.replace("DIR", str(FETCHED)).split()]
     ended = subprocess.run(command, capture_output=True, text=True, check=False, cwd="/")
-    return ended.stdout + ended.stderr, ended.returncode
+    said = ended.stdout + ended.stderr
+    assert "%s" not in said and (said or ended.returncode <= 0), ended
+    return said, ended.returncode
 
 
 def sh(command):
@@ -98,7 +100,8 @@ def test_the_life_of_a_device():
         "system: 2026a.1.0\nschema: 44l\nnewest: 2026c.1.0\nnext run: keeps the active copy\n"
         "zone: Asia/Tokyo\nlast switch: 2026b.1.0_2026c.1.0\n"
         "downloads: 2026b.1.0 2026c.1.0\nwithdrawn: none\n", 0)
-    assert ctl("back 2026b.1.0") == ("2026b.1.0 is active\n", 0)
+    assert ctl("back 2026b.1.0", *STRICTLY) == ("2026b.1.0 is active\n", 0)
+    assert os.stat(STORAGE / "withdrawn").st_mode & 0o777 == 0o644
     assert "newest: 2026b.1.0\n" in ctl("status")[0] and well() is True
     assert ctl("publish 2026c.1.0 DIR")[1] == 3
     assert ctl("back 2026c.1.0") == ("2026c.1.0 is active\n", 0)
@@ -154,7 +157,8 @@ def test_versions(version, status, line):
     pytest.param("chown 4321 zoneinfo/Etc", "zoneinfo/Etc belongs to another user: chown -R it",
                  marks=several_users),
     ("chmod g+w icutz", "others than its owner can write /tmp/fetched/icutz: chmod -R go-w it"),
-    (": >\"zoneinfo/$(printf '\\033')[2J\"", "zoneinfo/?[2J is not whole"),
+    (": >\"zoneinfo/$(printf '\\033')~\"", "zoneinfo/?~ is not whole"),
+    ("mkdir -p zoneinfo/$(printf 'd/%.0s' {1..70})", "d/d lies too deep"),
     ("rm -r /tmp/fetched", "/tmp/fetched is missing or no directory"),
 ])
 def test_damaged_downloads(damage, line):
@@ -162,7 +166,7 @@ def test_damaged_downloads(damage, line):
     fetch("2026c")
     Path("/tmp/big").write_bytes(bundle(">"))
     before = found()
-    subprocess.run(damage, shell=True, cwd=FETCHED, check=True)
+    subprocess.run(["bash", "-c", damage], cwd=FETCHED, check=True)
     said = ctl("publish 2026c.1.0 DIR")
     assert (line in said[0], said[1], found()) == (True, 4, before), said
 
@@ -298,7 +302,7 @@ def test_replacement():
 
 def test_publishing_in_place():
     fetch("2026b", STORAGE / "tz/2026b.1.0")
-    sh("chmod -R go= tz/2026b.1.0")
+    sh("chmod -R go= tz/2026b.1.0; mkdir /var/db/icu; : >/var/db/icu/kept")
     there = ctl("publish 2026b.1.0 /var/db/timezone/tz/2026b.1.0", *STRICTLY)
     assert there == ("2026b.1.0 is active\n", 0) and well() is True
     fetch("2026c", STORAGE / "tz/2026d.1.0")
@@ -364,14 +368,29 @@ def test_full_storage(line, said, limit):
     assert well() is True
 
 
+def test_no_room_to_publish():
+    publish("2026b")
+    fetch("2026c")
+    if sh("mount --options-source=disable -o remount,nr_inodes="
+          "$(($(df --output=iused /var | tail -n 1))) /var").returncode:
+        pytest.skip("only root can remount")
+    before = found()
+    said = ctl("publish 2026c.1.0 DIR")
+    sh("mount --options-source=disable -o remount,nr_inodes=1000000 /var")
+    assert said[0].endswith("there is no room: kestrelctl prune makes some\n") and said[1] == 5
+    assert found() == before
+
+
 def test_prune():
     publish("2026b", "2026c", "2026d")
-    sh("cp -r tz/2026b.1.0 tz/2025z.1.0; mkdir -p tz/.kestrelctl/x tz/lost+found tz/2026e;"
+    sh("ln -s x tz_latest.new; : >withdrawn.new; cp -r tz/2026b.1.0 tz/2025z.1.0;"
+       "mkdir -p tz/.kestrelctl/x tz/lost+found tz/2026e;"
        "ln -s 2026b.1.0 tz/2026y; ln -s 2026z tz/2026z; : >tz/2026x; ln -s $PWD/tz/2026e held")
     assert ctl("prune") == ("removed /var/db/timezone/tz/.kestrelctl\n"
                             "removed /var/db/timezone/tz/2025z.1.0\n", 0)
     assert sorted(os.listdir(STORAGE / "tz")) == [
         "2026b.1.0", "2026c.1.0", "2026d.1.0", "2026e", "2026x", "2026y", "2026z", "lost+found"]
+    assert not [name for name in os.listdir(STORAGE) if name.endswith(".new")]
 
 
 def test_prune_keeps_no_withdrawn_copy_but_the_last():
@@ -393,10 +412,20 @@ def test_one_at_a_time():
 
 
 @several_users
+def test_closed_zones_of_another_user():
+    publish("2026b")
+    os.chmod(STORAGE / "tz/2026b.1.0/zoneinfo/Asia", 0o700)
+    said = ctl("status", "setpriv", "--reuid=4321", "--clear-groups")
+    assert said[0].endswith("/zoneinfo/Asia: chmod 755 it\n") and said[0].count("kestrelctl: ") == 1
+
+
+@several_users
 def test_storage_of_another_user():
     sh("chown -hR 1234:1234 .")
     publish("2026b")
     assert {os.stat(path).st_uid for path in (STORAGE / "tz").rglob("*")} == {1234}
+    record = os.stat(STORAGE / "TZVersionDiffRecord")
+    assert (record.st_uid, record.st_gid) == (0, 0)
     for line, said in (("publish 2026d.1.0 DIR", "2026d.1.0 waits for the next run of kestrel\n"),
                        ("publish 2026b.1.0 /var/db/timezone/tz/2026b.1.0", "2026b.1.0 is active\n"),
                        ("zone Etc/UTC", "zone: Etc/UTC\n"), ("back", "2026a.1.0 is active\n")):
@@ -482,9 +511,10 @@ def test_copies_that_others_can_change():
     publish("2026b")
     os.chmod(STORAGE / "tz/2026b.1.0/zoneinfo/Etc/UTC", 0o666)
     fetch("2026b")
-    (FETCHED / "zoneinfo/more").write_text("more")
-    said = ctl("publish 2026b.1.0 DIR")
-    assert said[1] == 4 and "has other content" in said[0]
+    for change in ("echo more >zoneinfo/more", "rm -r zoneinfo/more icutz"):
+        subprocess.run(change, shell=True, cwd=FETCHED, check=True)
+        said = ctl("publish 2026b.1.0 DIR")
+        assert said[1] == 4 and "has other content" in said[0]
     publish("2026b")
     assert os.stat(STORAGE / "tz/2026b.1.0/zoneinfo/Etc/UTC").st_mode & 0o777 == 0o644
 
@@ -502,7 +532,8 @@ def test_no_link_is_lost():
 # The first run has to go back, the second one switches.
 def test_publishing_beside_a_copy_of_another_schema():
     fetch("2099z", STORAGE / "tz/2099z.1.0")
-    sh("cd tz/2099z.1.0; mv icutz/icutz44{l,b}.dat; ln -sfn $PWD/zoneinfo $PWD/icutz ../..")
+    sh("cd tz/2099z.1.0; mv icutz/icutz44{l,b}.dat; ln -sfn $PWD/zoneinfo $PWD/icutz ../..;"
+       "ln -sfn $PWD ../../tz_latest")
     fetch("2026b")
     said = ctl("publish 2026b.1.0 DIR")
     assert said[0].startswith("2026b.1.0 is active\n") and said[1] == 0
@@ -521,6 +552,10 @@ def test_order_of_writes():
     order = re.findall(r'syncfs|execve(?=.*kestrel")|(?<=timezone/)\S+(?="\) = 0)', done)
     assert order == ["syncfs", "tz/2026b.1.0", "syncfs", "tz_latest", "syncfs", "execve",
                      "zoneinfo", "icutz"]
+    opened = re.findall(r"openat\(\d+<.*", TRACE.read_text())
+    assert opened and all("O_NOFOLLOW" in call for call in opened)
+    ctl("zone Etc/UTC", *TRACER)
+    assert re.search(r'timezone/localtime"\) = 0\n(.*\n)*syncfs', TRACE.read_text())
     publish("2026c")
     ctl("back 2026b.1.0", *TRACER)
     order = re.findall(r'^(f?sync)|^rename.*(?<=timezone/)(\S+)"\) = 0', TRACE.read_text(), re.M)
@@ -543,12 +578,30 @@ def test_the_run():
 
 
 @pytest.mark.parametrize("name", ["Asia/Seoul", "Asia", "", "/etc/passwd", "Asia/../Japan", "..",
-                                  "./Japan", "Japan/", "localtime", "Etc/UTC\n", "+VERSION"])
+                                  "./Japan", "Japan/", "localtime", "Etc/UTC\n", "+VERSION",
+                                  "/tmp/machine/share/zoneinfo/Asia/Tokyo"])
 def test_no_zone(name):
     before = found()
     said = subprocess.run(["kestrelctl", "zone", name], capture_output=True, text=True, check=False)
     assert said.returncode == 4 and "is no whole zone of the active copy" in said.stderr
     assert found() == before
+
+
+def test_failed_calls():
+    publish("2026b")
+    for error, said in (("EIO", "kestrelctl: /var/db/timezone/: Input/output error\n"),
+                        ("ENOSPC", "kestrelctl: /var/db/timezone/: No space left on device\n"
+                         "kestrelctl: there is no room: kestrelctl prune makes some\n")):
+        ended = ctl("zone Asia/Tokyo", *TRACER, "-e", f"inject=syncfs:error={error}")
+        assert ended == (said, 1 if error == "EIO" else 5)
+
+
+def test_signals():
+    publish("2026b")
+    fetch("2026c")
+    assert sh("{ sleep .1; kestrelctl status; } | true; exit ${PIPESTATUS[0]}").returncode == 1
+    assert sh("ulimit -f 0; kestrelctl publish 2026c.1.0 /tmp/fetched").returncode == 1
+    assert well() is True
 
 
 def test_usage():

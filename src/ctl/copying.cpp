@@ -52,7 +52,7 @@ std::vector<std::string> names_in(const place& from) {
 
 /// Why an entry is not safe from others, who can exchange or write it meanwhile.
 faults faults_of_owner(const struct stat& found, const std::string& path) {
-  if (found.st_uid != 0 && found.st_uid != ::getuid() && found.st_uid != ::geteuid())
+  if (found.st_uid != 0 && found.st_uid != ::geteuid())
     return {fault("%s belongs to another user", {path}, "chown -R it")};
   if ((found.st_mode & (S_IWGRP | S_IWOTH)) != 0)
     return {fault("others than its owner can write %s", {path}, "chmod -R go-w it")};
@@ -76,7 +76,7 @@ void copy_file(const place& from, const place& to, const std::string& name) {
   check(S_ISREG(found.st_mode), path);
   const fs::descriptor copy(::openat(
       to.directory, name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, file_mode));
-  check(copy.is_open() && ::fchmod(copy.get(), file_mode) == 0, to / name);
+  check(copy.is_open(), to / name);
   std::array<char, 65536> block;
   for (ssize_t count = 1; count > 0;) {
     count = ::read(source.get(), block.data(), block.size());
@@ -127,7 +127,7 @@ faults copy_directory(const place& from, const place& to, const std::string& nam
   const std::string path = to / name;
   const fs::descriptor source(::openat(from.directory, name.c_str(), directory_flags));
   check(source.is_open(), from / name);
-  check(::mkdirat(to.directory, name.c_str(), S_IRWXU) == 0, path);
+  check(::mkdirat(to.directory, name.c_str(), directory_mode) == 0, path);
   const fs::descriptor copy(::openat(to.directory, name.c_str(), directory_flags));
   check(copy.is_open(), path);
   const place below{source.get(), from / name, from.levels_left - 1};
@@ -136,7 +136,6 @@ faults copy_directory(const place& from, const place& to, const std::string& nam
     for (const std::string& entry : names_in(below))
       append(found, copy_entry(below, {copy.get(), path}, entry));
   }
-  check(::fchmod(copy.get(), directory_mode) == 0, path);
   return found;
 }
 
@@ -179,7 +178,7 @@ faults copy_download(const std::string& from, const std::string& to) {
   check(source.is_open(), from);
   check(::mkdir(to.c_str(), directory_mode) == 0, to);
   const fs::descriptor copy(::open(to.c_str(), directory_flags));
-  check(copy.is_open() && ::fchmod(copy.get(), directory_mode) == 0, to);
+  check(copy.is_open(), to);
   const place download{source.get(), from};
   faults found = faults_of_directory(download);
   if (!found.empty()) return found;

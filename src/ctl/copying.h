@@ -5,9 +5,9 @@
 #include "ctl/fault.h"
 
 /// Copies "zoneinfo" and "icutz" of the download in the directory `from` into the directory `to`,
-/// which is not there yet. Directories get mode 0755, files 0644, links their content. Gives what
+/// which is not there yet. Directories get mode 0755, files 0644, both less the umask. Gives what
 /// may not be copied:
-/// - a directory that is owned by another than root, the caller or the storage's owner, or that
+/// - a directory that is owned by another than root or the storage's owner, or that
 ///   others than its owner can write: they could put a link to somebody else's file there
 ///   meanwhile;
 /// - what is neither a file, nor a directory, nor a link.

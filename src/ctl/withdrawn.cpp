@@ -30,7 +30,6 @@ void write_withdrawn(const version_set& versions) {
   }
   std::string lines;
   for (const std::string& version : versions) lines += version + "\n";
-  static_cast<void>(::unlink(new_withdrawn_list));
   const fs::descriptor file(
       ::open(new_withdrawn_list, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0644));
   check(file.is_open(), new_withdrawn_list);
