@@ -31,7 +31,6 @@ device read_device() {
   now.localtime_target = link_target(paths::localtime_link);
   now.system_version = now.view.system ? now.view.system->get_version_string()
                                        : fs::read_first_word(system_version_file) + ".1.0";
-  now.active_version = "none";
   if (now.view.current_path) {
     now.active_version =
         now.view.current_path->empty() ? now.system_version : version_in(*now.view.current_path);

@@ -10,7 +10,7 @@
 /// The file whose first word is the system copy's release, such as 2026b.
 inline constexpr const char* system_version_file = "/usr/share/zoneinfo.default/+VERSION";
 
-/// All that the commands know of the device. Read once; what is wrong is found from it.
+/// What the commands know of the links and versions of the device. Read once; they decide by it.
 struct device {
   run_view view;
   next_run next{next_run::action::keeps};
@@ -22,7 +22,7 @@ struct device {
   std::string localtime_target;
 
   std::string system_version;  // the version texts of the copies, as a run has them
-  std::string active_version;  // "none" where the zoneinfo link names no copy
+  std::string active_version;  // empty where the zoneinfo link names no copy
   std::string latest_version;  // empty where there is no tz_latest
   std::string system_schema;
   std::string zone;  // the local zone's name; empty where it is not reached through zoneinfo

@@ -19,9 +19,9 @@
 
 namespace {
 
-constexpr const char* repair = "repair the image";
-constexpr const char* start = "start a run of kestrel";
-constexpr const char* set_zone = "kestrelctl zone NAME";
+constexpr const char* repair_image = "repair the image";
+constexpr const char* start_run = "start a run of kestrel";
+constexpr const char* choose_zone = "kestrelctl zone NAME";
 
 bool is_other_than_link(const char* path) {
   return is_there(path) && link_target(path).empty();
@@ -37,7 +37,7 @@ faults with_cure(faults all, const std::string& cure) {
 /// What helps where the data of the active copy is not good.
 std::string cure_of_data(const device& now) {
   return now.view.current_path.value_or("").empty()
-             ? repair
+             ? repair_image
              : "publish " + now.active_version + " again, from good data";
 }
 
@@ -81,17 +81,20 @@ faults faults_of_system(const device& now) {
   const std::string& schema = now.system_schema;
   faults found;
   if (!leads_to_directory(paths::system_zoneinfo)) {
-    found.push_back(fault("%s is missing", {paths::system_zoneinfo}, repair));
+    found.push_back(fault("%s is missing", {paths::system_zoneinfo}, repair_image));
   } else if (now.system_version == ".1.0") {
-    found.push_back(fault("%s is missing, empty or unreadable", {system_version_file}, repair));
+    found.push_back(
+        fault("%s is missing, empty or unreadable", {system_version_file}, repair_image));
   } else if (version_of(now.system_version) == vela_version()) {
     found.push_back(
-        fault("%s does not name a release such as 2026b", {system_version_file}, repair));
+        fault("%s does not name a release such as 2026b", {system_version_file}, repair_image));
   }
   if (schema.empty()) {
-    found.push_back(fault("%s is missing, empty or unreadable", {paths::system_schema}, repair));
+    found.push_back(
+        fault("%s is missing, empty or unreadable", {paths::system_schema}, repair_image));
   } else if (data_file_schema("icutz" + schema + ".dat") != schema) {
-    found.push_back(fault("%s does not name a schema such as 44l", {paths::system_schema}, repair));
+    found.push_back(
+        fault("%s does not name a schema such as 44l", {paths::system_schema}, repair_image));
   }
   return found;
 }
@@ -116,10 +119,10 @@ faults faults_of_fitness(const device& now, const std::string& path, const vela_
 
 faults faults_of_active_links(const device& now) {
   const std::string zoneinfo = paths::zoneinfo_link;
-  if (!is_there(zoneinfo)) return {fault("%s is missing", {zoneinfo}, start)};
+  if (!is_there(zoneinfo)) return {fault("%s is missing", {zoneinfo}, start_run)};
   if (is_other_than_link(paths::zoneinfo_link)) return {};  // see faults_of_link_places
   if (!now.view.current_path)
-    return {fault("%s leads to %s, which is no copy", {zoneinfo, now.zoneinfo_target}, start)};
+    return {fault("%s leads to %s, which is no copy", {zoneinfo, now.zoneinfo_target}, start_run)};
   const std::string& path = *now.view.current_path;
   if (!path.empty() && version_of(now.active_version) == vela_version()) return {};
   if (now.zoneinfo_target != zoneinfo_directory(path)) {
@@ -136,8 +139,8 @@ faults faults_of_active(const device& now) {
   const std::string& path = *now.view.current_path;
   if (!path.empty()) {
     const std::string leave = now.latest_target == path
-                                  ? std::string(start) + ", and remove " + paths::latest_link
-                                  : start;
+                                  ? std::string(start_run) + ", and remove " + paths::latest_link
+                                  : start_run;
     if (!leads_to_directory(path)) return {fault("%s is missing", {path}, leave)};
     if (!now.view.current || version_of(now.active_version) == vela_version())
       return {fault("%s has a name that is no version", {path}, leave)};
@@ -176,7 +179,7 @@ faults faults_of_next_run(const device& now, bool is_last) {
   const std::string others = "see the other lines";
   if (now.next.what == keeps) return {};
   if (now.next.what != fails)
-    return {fault("the next run of kestrel %s", {to_text(now.next)}, is_last ? start : others)};
+    return {fault("the next run of kestrel %s", {to_text(now.next)}, is_last ? start_run : others)};
   faults found = {fault("the next run of kestrel %s", {"fails"}, others)};
   if (!now.view.can_change_storage) {
     found.push_back(fault("%s is missing, read-only, or append-only", {paths::storage},
@@ -190,7 +193,7 @@ faults faults_of_remains(const device& now) {
   const std::string path = now.view.current_path.value_or("");
   faults found;
   if (fs::is_symlink_to(icu_directory(path).c_str(), paths::new_icu_link))
-    found.push_back(fault("%s is of a run that was killed", {paths::new_icu_link}, start));
+    found.push_back(fault("%s is of a run that was killed", {paths::new_icu_link}, start_run));
   if (fs::exists(paths::legacy_icu_link))
     found.push_back(fault("%s is of an older system", {paths::legacy_icu_link}, "remove it"));
   std::error_code error;
@@ -204,11 +207,11 @@ faults faults_of_remains(const device& now) {
 faults faults_of_zone(const device& now) {
   const std::string localtime = paths::localtime_link;
   if (is_other_than_link(paths::localtime_link))
-    return {fault("%s is no link", {localtime}, std::string("remove it, and ") + set_zone)};
-  if (now.localtime_target.empty()) return {fault("%s is missing", {localtime}, set_zone)};
+    return {fault("%s is no link", {localtime}, std::string("remove it, and ") + choose_zone)};
+  if (now.localtime_target.empty()) return {fault("%s is missing", {localtime}, choose_zone)};
   if (now.zone.empty()) {
     return {fault("%s leads to %s, not into %s",
-                  {localtime, now.localtime_target, paths::zoneinfo_link}, set_zone)};
+                  {localtime, now.localtime_target, paths::zoneinfo_link}, choose_zone)};
   }
   if (!now.view.current_path || has_zone(*now.view.current_path, now.zone)) return {};
   const std::string file = zoneinfo_directory(*now.view.current_path) + "/" + now.zone;
@@ -217,7 +220,7 @@ faults faults_of_zone(const device& now) {
   const bool is_zone = read_file(file).value_or("").starts_with("TZif") ||
                        (has_zone("", now.zone) && is_there(twin));
   return {fault("the local zone %s is not whole in the active copy", {now.zone},
-                is_zone ? cure_of_data(now) : set_zone)};
+                is_zone ? cure_of_data(now) : choose_zone)};
 }
 
 /// Programs find the links by these, which the image sets.
@@ -259,7 +262,7 @@ faults faults_of_link_places(const device& now) {
   const std::string icutz = paths::icu_link;
   faults found;
   if (is_other_than_link(paths::zoneinfo_link))
-    found.push_back(fault("%s is no link", {zoneinfo}, std::string("remove it, and ") + start));
+    found.push_back(fault("%s is no link", {zoneinfo}, std::string("remove it, and ") + start_run));
   if (is_other_than_link(paths::icu_link))
     found.push_back(fault("%s is no link", {icutz}, "remove it, and " + way_back_to(now)));
   if (is_other_than_link(paths::latest_link))
@@ -278,7 +281,7 @@ faults faults_of_ground(const device& now) {
 faults faults_of_way_back(const device& now, const std::string& version) {
   const std::string path = version.empty() ? "" : path_of(version);
   if (!now.view.system)
-    return {fault("%s does not name a release such as 2026b", {system_version_file}, repair)};
+    return {fault("%s does not name a release such as 2026b", {system_version_file}, repair_image)};
   faults found;
   if (!path.empty()) {
     if (!leads_to_directory(path)) return {fault("%s is missing", {path})};

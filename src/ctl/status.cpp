@@ -41,7 +41,7 @@ outcome print_status() {
     print("downloads", joined(ways.accepted));
     found = ways.reasons;
   }
-  print("withdrawn", joined(now.withdrawn.value_or(version_set())));
+  if (now.withdrawn) print("withdrawn", joined(*now.withdrawn));
   append(found, faults_of(now));
   complain_all(found);
   return found.empty() ? outcome::done : outcome::failed;
