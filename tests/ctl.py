@@ -424,6 +424,15 @@ def test_closed_zones_of_another_user():
 
 
 @several_users
+def test_system_copy_that_the_owner_cannot_read():
+    publish("2026b")
+    sh("chown -hR 1234:1234 .; chmod 600 /usr/share/zoneinfo.default/+VERSION")
+    for line in ("back", "prune", "publish 2026b.1.0 DIR"):
+        said = ctl(line)
+        assert said[1] == 1 and "not everyone can read /usr/share/zoneinfo.default/+V" in said[0]
+
+
+@several_users
 def test_storage_of_another_user():
     sh("chown -hR 1234:1234 .")
     publish("2026b")
@@ -615,5 +624,7 @@ def test_usage():
                  "back x"):
         said = ctl(line)
         assert said[1] == 2 and said[0].startswith("kestrelctl: "), line
-    assert ctl("--help")[1] == ctl("--version")[1] == 0
+    assert ctl("--help") == ("usage: kestrelctl status | publish VERSION DIRECTORY | "
+                             "back [VERSION] | prune | zone NAME\n", 0)
+    assert ctl("--version")[1] == 0
     assert sh("kestrelctl --version >/dev/full").returncode == 1

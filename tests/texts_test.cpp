@@ -144,6 +144,7 @@ TEST(Whole, Bundles) {
     bundle[8] = big ? '\1' : '\0';
     bundle[big ? 32 + 19 : 32 + 16] = '\6';
     EXPECT_TRUE(is_whole_bundle(bundle)) << big;
+    EXPECT_FALSE(is_whole_bundle(std::string(bundle).replace(2, 1, "x"))) << big;
     EXPECT_EQ(has_byte_order_of("44l", bundle), !big);
     EXPECT_EQ(has_byte_order_of("44e", bundle), big);
     for (std::size_t size = 0; size < bundle.size(); ++size)
