@@ -86,8 +86,8 @@ void inspect_link(inspection& copy, const std::filesystem::path& inside,
                   const std::filesystem::path& twin) {
   if (link_target(copy.top / inside) == local_zone) return;
   struct stat found {};
-  const bool is_there = ::stat((copy.top / inside).c_str(), &found) == 0;
-  const bool is_closed = is_there ? (found.st_mode & S_IROTH) == 0 : errno == EACCES;
+  const bool ends = ::stat((copy.top / inside).c_str(), &found) == 0;
+  const bool is_closed = ends ? (found.st_mode & S_IROTH) == 0 : errno == EACCES;
   if (is_closed) return;  // which is a fault of what it leads to
   const auto end = end_of(copy.top, inside, twin);
   if (!end) {
