@@ -5,7 +5,7 @@
 #include "ctl/fault.h"
 
 // The commands. Each finds out first, then acts, and prints what it has done or why it has not. It
-// throws `int` for a change of a link that failed (see `take_reports`) and std::system_error for
+// throws `int` for a change of a link that failed (see `reports`) and std::system_error for
 // every other system call that failed.
 
 /// Prints the state of the device, a line "name: value" for each fact, and what is wrong. `done`

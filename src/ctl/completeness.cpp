@@ -4,11 +4,9 @@
 
 #include <cerrno>
 #include <filesystem>
-#include <map>
 #include <optional>
 #include <sstream>
 #include <system_error>
-#include <utility>
 
 #include "ctl/bundle.h"
 #include "ctl/files.h"
@@ -28,33 +26,19 @@ struct inspection {
   std::filesystem::path shown;  // how the lines call `top`
   std::string schema;           // the system copy's
   faults found = {};
-  // Whether the end of a link, of a zone's name or not, is good: many lead to the same.
-  std::map<std::pair<std::string, bool>, bool> ends = {};
 
   [[nodiscard]] std::string name_of(const std::filesystem::path& inside) const {
-    return shown / inside;
+    return inside.empty() ? shown : shown / inside;
   }
 };
 
-/// Calls `look(entry, its path relative to top)` for all that is below a directory of the copy;
-/// `look` gives false where it is not to go into that directory.
-template <typename Look>
-void walk(const std::filesystem::path& top, const std::filesystem::path& below, Look look) {
-  const auto options = std::filesystem::directory_options::skip_permission_denied;
-  std::filesystem::recursive_directory_iterator entry(top / below, options);
-  for (; entry != std::filesystem::recursive_directory_iterator(); ++entry)
-    if (!look(*entry, entry->path().lexically_relative(top))) entry.disable_recursion_pending();
+std::filesystem::recursive_directory_iterator everything_in(const std::filesystem::path& top) {
+  return {top, std::filesystem::directory_options::skip_permission_denied};
 }
 
 bool is_open_to_all(const std::filesystem::file_status& status) {
-  using std::filesystem::perms;
-  const perms needed =
-      is_directory(status) ? perms::others_read | perms::others_exec : perms::others_read;
+  const std::filesystem::perms needed{is_directory(status) ? 0555U : 0444U};
   return (status.permissions() & needed) == needed;
-}
-
-fault closed_to_some(const std::string& path, bool is_directory) {
-  return fault("not everyone can read %s", {path}, is_directory ? "chmod 755 it" : "chmod 644 it");
 }
 
 /// The names of zones begin with capital letters, those of tables do not.
@@ -85,21 +69,16 @@ std::optional<std::filesystem::path> end_of(const std::filesystem::path& top,
 void inspect_link(inspection& copy, const std::filesystem::path& inside,
                   const std::filesystem::path& twin) {
   if (link_target(copy.top / inside) == local_zone) return;
-  struct stat found {};
-  const bool ends = ::stat((copy.top / inside).c_str(), &found) == 0;
-  const bool is_closed = ends ? (found.st_mode & S_IROTH) == 0 : errno == EACCES;
-  if (is_closed) return;  // which is a fault of what it leads to
   const auto end = end_of(copy.top, inside, twin);
   if (!end) {
     copy.found.push_back(
         fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
-    return;
+  } else if (const std::string closed = closed_part(*end); !closed.empty()) {
+    copy.found.push_back(closed_to_some(closed));
+  } else if (!leads_to_directory(*end) &&
+             !is_zone_or_table(read_file(*end).value_or(""), has_zone_name(inside))) {
+    copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
   }
-  const bool is_zone = has_zone_name(inside);
-  const auto [known, is_new] = copy.ends.try_emplace({*end, is_zone}, true);
-  if (is_new && !leads_to_directory(*end))
-    known->second = is_zone_or_table(read_file(*end).value_or(""), is_zone);
-  if (!known->second) copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
 }
 
 /// Whether the directory `name` of the copy is one, inside of it, so that it can be looked at.
@@ -110,7 +89,7 @@ bool inspect_top(inspection& copy, const std::filesystem::path& name) {
     copy.found.push_back(
         fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(name)}));
   } else if (!is_open_to_all(std::filesystem::status(copy.top / name))) {
-    copy.found.push_back(closed_to_some(copy.name_of(name), true));
+    copy.found.push_back(closed_to_some(copy.name_of(name)));
   } else {
     return true;
   }
@@ -120,7 +99,8 @@ bool inspect_top(inspection& copy, const std::filesystem::path& name) {
 void inspect_tree(inspection& copy) {
   const std::filesystem::path system = paths::system_zoneinfo;
   if (!inspect_top(copy, copy.tree)) return;
-  walk(copy.top, copy.tree, [&](const directory_entry& entry, const auto& inside) {
+  for (const auto& entry : everything_in(copy.top / copy.tree)) {
+    const std::filesystem::path inside = entry.path().lexically_relative(copy.top);
     const std::filesystem::file_status status = entry.symlink_status();
     if (is_symlink(status)) {
       inspect_link(copy, inside, system / inside.lexically_relative(copy.tree));
@@ -128,32 +108,38 @@ void inspect_tree(inspection& copy) {
       copy.found.push_back(
           fault("%s is neither a file, nor a directory, nor a link", {copy.name_of(inside)}));
     } else if (!is_open_to_all(status)) {
-      copy.found.push_back(closed_to_some(copy.name_of(inside), is_directory(status)));
+      copy.found.push_back(closed_to_some(copy.name_of(inside)));
     } else if (is_regular_file(status) &&
                !is_zone_or_table(read_file(entry.path()).value_or(""), has_zone_name(inside))) {
       copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
     }
-    return true;
-  });
+  }
 }
 
-/// What the system copy has; links that lead out of it are the image's own. A link of the copy that
-/// leads nowhere has its fault already.
+/// Whether the copy has what the system copy has as `theirs`, a file or a directory.
+bool inspect_counterpart(inspection& copy, const directory_entry& theirs,
+                         const std::filesystem::path& inside) {
+  const std::filesystem::path ours = copy.top / inside;
+  struct stat found {};
+  const bool is_found = ::stat(ours.c_str(), &found) == 0;
+  check(is_found || !is_hard(errno), ours);
+  const bool is_good = is_found && leads_to_directory(ours) == theirs.is_directory();
+  // What is closed, and a link that leads nowhere, has its fault already.
+  const bool is_told = !is_found && (errno == EACCES || is_there(ours));
+  if (!is_good && !is_told) copy.found.push_back(fault("%s is missing", {copy.name_of(inside)}));
+  return is_good;
+}
+
+/// What the system copy has; links that lead out of it are the image's own.
 void inspect_missing(inspection& copy) {
   const std::filesystem::path system = paths::system_zoneinfo;
-  walk(system, "", [&](const directory_entry& theirs, const auto& name) {
-    if (name == "+VERSION" || (theirs.is_symlink() && !resolve_inside(system, name))) return true;
-    const std::filesystem::path ours = copy.top / copy.tree / name;
-    struct stat found {};
-    const bool is_missing = ::stat(ours.c_str(), &found) != 0;
-    check(!is_missing || !is_hard(errno), ours);
-    const bool is_closed = is_missing && errno == EACCES;
-    if (!is_missing && S_ISDIR(found.st_mode) == theirs.is_directory()) return true;
-    const bool is_told =
-        is_closed || (is_there(ours) && !resolve_inside(copy.top, copy.tree / name));
-    if (!is_told) copy.found.push_back(fault("%s is missing", {copy.name_of(copy.tree / name)}));
-    return false;
-  });
+  if (!leads_to_directory(system)) return;
+  auto theirs = everything_in(system);
+  for (; theirs != std::filesystem::recursive_directory_iterator(); ++theirs) {
+    const std::filesystem::path name = theirs->path().lexically_relative(system);
+    if (name == "+VERSION" || (theirs->is_symlink() && !resolve_inside(system, name))) continue;
+    if (!inspect_counterpart(copy, *theirs, copy.tree / name)) theirs.disable_recursion_pending();
+  }
 }
 
 /// The files of the tree that name a release have to name that of the version.
@@ -193,18 +179,16 @@ void inspect_schema(inspection& copy) {
 /// Whether everyone can read what is in the directory.
 bool inspect_modes_of_bundles(inspection& copy) {
   const std::size_t before = copy.found.size();
-  walk(copy.top, "icutz", [&](const directory_entry& entry, const auto& inside) {
+  for (const auto& entry : std::filesystem::directory_iterator(copy.top / "icutz")) {
+    const std::filesystem::path inside = entry.path().lexically_relative(copy.top);
     const std::filesystem::file_status status = entry.symlink_status();
-    if (is_symlink(status)) {
-      if (!resolve_inside(copy.top, inside)) {
-        copy.found.push_back(
-            fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
-      }
-    } else if (!is_open_to_all(status)) {
-      copy.found.push_back(closed_to_some(copy.name_of(inside), is_directory(status)));
+    if (is_symlink(status) && !resolve_inside(copy.top, inside)) {
+      copy.found.push_back(
+          fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
+    } else if (!is_symlink(status) && !is_open_to_all(status)) {
+      copy.found.push_back(closed_to_some(copy.name_of(inside)));
     }
-    return false;
-  });
+  }
   return copy.found.size() == before;
 }
 

@@ -3,7 +3,6 @@
 #include <stdexcept>
 
 #include "ctl/files.h"
-#include "ctl/reports.h"
 #include "dataset/vela_icu.h"
 #include "dataset/vela_zoneinfo.h"
 #include "fs/file.h"
@@ -41,7 +40,6 @@ device read_device() {
   if (now.localtime_target.starts_with(through))
     now.zone = now.localtime_target.substr(through.size());
   now.withdrawn = read_withdrawn();
-  static_cast<void>(take_reports());
   return now;
 }
 
@@ -61,6 +59,5 @@ vela_version version_of(const std::string& text) {
   } catch (const std::out_of_range&) {
     version = {};
   }
-  static_cast<void>(take_reports());
   return version;
 }

@@ -10,7 +10,6 @@
 
 #include "ctl/completeness.h"
 #include "ctl/files.h"
-#include "ctl/reports.h"
 #include "dataset/vela_icu.h"
 #include "dataset/vela_zoneinfo.h"
 #include "fs/operations.h"
@@ -57,17 +56,28 @@ std::vector<std::string> places_of_copies(const device& now) {
   return places;
 }
 
+bool is_closed_to_us(const std::string& place) {
+  const int needed = leads_to_directory(place) ? R_OK | X_OK : R_OK;
+  return ::faccessat(AT_FDCWD, place.c_str(), needed, AT_EACCESS) != 0 && errno == EACCES;
+}
+
+faults faults_of_reading(const device& now) {
+  if (!now.view.is_uncertain) return {};
+  return {fault("the device cannot be read", {}, "start again")};
+}
+
 faults faults_of_places(const device& now) {
-  faults found;
+  faults found = faults_of_reading(now);
   for (const std::string place : {paths::storage, paths::downloads}) {
     if (!leads_to_directory(place))
       found.push_back(fault("%s is missing or no directory", {place}, "make it one"));
   }
   for (const std::string& place : places_of_copies(now)) {
-    const std::string closed = closed_part(place);
-    const fault one("not everyone can read %s", {closed}, "chmod a+rX it");
-    const auto is_same = [&one](const fault& other) { return other.what == one.what; };
-    if (!closed.empty() && std::ranges::none_of(found, is_same)) found.push_back(one);
+    if (const std::string closed = closed_part(place); !closed.empty()) {
+      found.push_back(closed_to_some(closed));
+    } else if (is_closed_to_us(place)) {
+      found.push_back(closed_to_some(place));  // by an access list, for example
+    }
   }
   return found;
 }
@@ -77,8 +87,16 @@ faults faults_of_list(const device& now) {
   return {fault("%s cannot be read", {withdrawn_list}, "remove it")};
 }
 
-faults faults_of_system(const device& now) {
+faults faults_of_system_schema(const device& now) {
   const std::string& schema = now.system_schema;
+  if (schema.empty())
+    return {fault("%s is missing, empty or unreadable", {paths::system_schema}, repair_image)};
+  if (data_file_schema("icutz" + schema + ".dat") != schema)
+    return {fault("%s does not name a schema such as 44l", {paths::system_schema}, repair_image)};
+  return {};
+}
+
+faults faults_of_system(const device& now) {
   faults found;
   if (!leads_to_directory(paths::system_zoneinfo)) {
     found.push_back(fault("%s is missing", {paths::system_zoneinfo}, repair_image));
@@ -89,13 +107,7 @@ faults faults_of_system(const device& now) {
     found.push_back(
         fault("%s does not name a release such as 2026b", {system_version_file}, repair_image));
   }
-  if (schema.empty()) {
-    found.push_back(
-        fault("%s is missing, empty or unreadable", {paths::system_schema}, repair_image));
-  } else if (data_file_schema("icutz" + schema + ".dat") != schema) {
-    found.push_back(
-        fault("%s does not name a schema such as 44l", {paths::system_schema}, repair_image));
-  }
+  append(found, faults_of_system_schema(now));
   return found;
 }
 
@@ -103,9 +115,11 @@ faults faults_of_system(const device& now) {
 faults faults_of_fitness(const device& now, const std::string& path, const vela_dataset& copy) {
   const std::string schema = schema_of(path);
   if (!now.view.system || may_stay(copy, *now.view.system)) return {};
+  for (const auto& subject : {faults_of_reading, faults_of_system_schema})
+    if (faults found = subject(now); !found.empty()) return found;
   const std::string file = path + "/icutz/icutz" + now.system_schema + ".dat";
-  if (schema.empty() && is_there(file) && !closed_part(file).empty())
-    return {fault("not everyone can read %s", {closed_part(file)}, "chmod a+rX it")};
+  if (const std::string closed = closed_part(file); schema.empty() && !closed.empty())
+    return {closed_to_some(closed)};
   if (schema.empty()) {
     return {fault("%s is missing or no file", {file},
                   "publish " + path.substr(path.rfind('/') + 1) + " again, from good data")};
@@ -124,7 +138,8 @@ faults faults_of_active_links(const device& now) {
   if (!now.view.current_path)
     return {fault("%s leads to %s, which is no copy", {zoneinfo, now.zoneinfo_target}, start_run)};
   const std::string& path = *now.view.current_path;
-  if (!path.empty() && version_of(now.active_version) == vela_version()) return {};
+  if (version_of(now.active_version) == vela_version() || !is_there(zoneinfo_directory(path)))
+    return {};  // see faults_of_active
   if (now.zoneinfo_target != zoneinfo_directory(path)) {
     return {fault("%s leads to %s, which no program expects", {zoneinfo, now.zoneinfo_target},
                   way_back_to(now))};
@@ -197,9 +212,10 @@ faults faults_of_remains(const device& now) {
   if (fs::exists(paths::legacy_icu_link))
     found.push_back(fault("%s is of an older system", {paths::legacy_icu_link}, "remove it"));
   std::error_code error;
-  if (is_there(paths::legacy_icu) &&
-      (!std::filesystem::is_directory(std::filesystem::symlink_status(paths::legacy_icu, error)) ||
-       std::filesystem::is_empty(paths::legacy_icu, error) || error))
+  const bool is_in_use =
+      std::filesystem::is_directory(std::filesystem::symlink_status(paths::legacy_icu, error)) &&
+      !std::filesystem::is_empty(paths::legacy_icu, error);
+  if (is_there(paths::legacy_icu) && !is_in_use)
     found.push_back(fault("%s is of an older system", {paths::legacy_icu}, "remove it"));
   return found;
 }
@@ -214,13 +230,10 @@ faults faults_of_zone(const device& now) {
                   {localtime, now.localtime_target, paths::zoneinfo_link}, choose_zone)};
   }
   if (!now.view.current_path || has_zone(*now.view.current_path, now.zone)) return {};
-  const std::string file = zoneinfo_directory(*now.view.current_path) + "/" + now.zone;
-  const std::string twin = zoneinfo_directory("") + "/" + now.zone;
-  if (::faccessat(AT_FDCWD, file.c_str(), R_OK, AT_EACCESS) != 0 && errno == EACCES) return {};
-  const bool is_zone = read_file(file).value_or("").starts_with("TZif") ||
-                       (has_zone("", now.zone) && is_there(twin));
+  const std::string tree = zoneinfo_directory(*now.view.current_path);
+  if (!is_there(tree) || is_closed_to_us(tree + "/" + now.zone)) return {};  // told already
   return {fault("the local zone %s is not whole in the active copy", {now.zone},
-                is_zone ? cure_of_data(now) : choose_zone)};
+                has_zone("", now.zone) ? cure_of_data(now) : choose_zone)};
 }
 
 /// Programs find the links by these, which the image sets.
@@ -245,15 +258,10 @@ faults faults_of(const device& now) {
   append(found, faults_of_next_run(now, found.empty()));
   append(found, faults_of_entrance("/etc/localtime", paths::localtime_link));
   append(found, faults_of_entrance(paths::legacy_zoneinfo, paths::zoneinfo_link));
-  static_cast<void>(take_reports());
   return found;
 }
 
 bool is_blind(const device& now) {
-  const auto is_closed_to_us = [](const std::string& place) {
-    const int needed = leads_to_directory(place) ? R_OK | X_OK : R_OK;
-    return ::faccessat(AT_FDCWD, place.c_str(), needed, AT_EACCESS) != 0 && errno == EACCES;
-  };
   return std::ranges::any_of(places_of_copies(now), is_closed_to_us);
 }
 
@@ -289,11 +297,10 @@ faults faults_of_way_back(const device& now, const std::string& version) {
     found = faults_of_fitness(now, path, copy);
     if (found.empty()) found = faults_of_copy(path, version, path);
     if (const std::string closed = closed_part(path); found.empty() && !closed.empty())
-      found.push_back(fault("not everyone can read %s", {closed}, "chmod a+rX it"));
+      found.push_back(closed_to_some(closed));
   }
   if (found.empty() && !now.zone.empty() && !has_zone(path, now.zone))
     found.push_back(fault("%s has not the local zone, %s", {zoneinfo_directory(path), now.zone}));
-  static_cast<void>(take_reports());
   return found;
 }
 

@@ -7,6 +7,10 @@ fault::fault(std::string_view format, std::initializer_list<std::string> texts,
              std::string what_to_do)
     : what(filled(format, texts)), cure(std::move(what_to_do)) {}
 
+fault closed_to_some(const std::string& path) {
+  return fault("not everyone can read %s", {path}, "chmod a+rX it");
+}
+
 void append(faults& all, const faults& more) {
   all.insert(all.end(), more.begin(), more.end());
 }

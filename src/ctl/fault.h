@@ -18,6 +18,9 @@ struct fault {
 };
 using faults = std::vector<fault>;
 
+/// That not everyone can read what is at `path`.
+[[nodiscard]] fault closed_to_some(const std::string& path);
+
 /// Adds what is in `more` to `all`.
 void append(faults& all, const faults& more);
 

@@ -13,8 +13,7 @@
 #include "fs/descriptor.h"
 
 bool is_hard(int error) {
-  constexpr std::array soft = {0,      ENOENT, ENOTDIR, EACCES, EPERM, ELOOP, ENAMETOOLONG,
-                               EINVAL, ENXIO,  ENODEV,  EISDIR, ERANGE};
+  constexpr std::array soft = {0, ENOENT, ENOTDIR, EACCES, ELOOP, ENAMETOOLONG, EINVAL, ERANGE};
   return std::ranges::find(soft, error) == soft.end();
 }
 
@@ -26,21 +25,19 @@ std::optional<std::string> read_file(const std::string& path) {
   constexpr off_t limit = 2L << 20;
   struct stat found {};
   check(::stat(path.c_str(), &found) == 0 || !is_hard(errno), path);
-  if (!S_ISREG(found.st_mode)) return {};
-  // O_NONBLOCK and the second look are for an entry that changes in between.
+  if (!S_ISREG(found.st_mode) || found.st_size > limit) return {};
+  // O_NONBLOCK is for an entry that changes in between.
   const fs::descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
   check(file.is_open() || !is_hard(errno), path);
-  if (!file.is_open() || ::fstat(file.get(), &found) != 0 || !S_ISREG(found.st_mode)) return {};
-  if (found.st_size > limit) return {};
-  std::string content;
-  std::array<char, 65536> block;
-  while (content.size() <= static_cast<std::size_t>(limit)) {
-    const ssize_t count = ::read(file.get(), block.data(), block.size());
+  if (!file.is_open()) return {};
+  std::string content(static_cast<std::size_t>(found.st_size), '\0');
+  std::size_t size = 0;
+  for (ssize_t count = 1; count > 0; size += static_cast<std::size_t>(count)) {
+    count = ::read(file.get(), content.data() + size, content.size() - size);
     check(count >= 0, path);
-    if (count == 0) return content;
-    content.append(block.data(), static_cast<std::size_t>(count));
   }
-  return {};
+  content.resize(size);
+  return content;
 }
 
 std::string link_target(const std::string& path) {
@@ -60,9 +57,8 @@ bool is_there(const std::string& path) {
 
 bool leads_to_directory(const std::string& path) {
   struct stat found {};
-  const bool found_it = ::stat(path.c_str(), &found) == 0;
-  check(found_it || !is_hard(errno), path);
-  return found_it && S_ISDIR(found.st_mode);
+  check(::stat(path.c_str(), &found) == 0 || !is_hard(errno), path);
+  return S_ISDIR(found.st_mode);
 }
 
 std::string closed_part(const std::string& path) {
@@ -75,9 +71,8 @@ std::string closed_part(const std::string& path) {
   for (const auto& name : real) {
     way /= name;
     if (::stat(way.c_str(), &found) != 0) return {};
-    const bool is_last = way == real;
-    const mode_t pass = S_ISDIR(found.st_mode) ? S_IXOTH : 0;
-    if ((found.st_mode & pass) != pass || (is_last && (found.st_mode & S_IROTH) == 0)) return way;
+    const mode_t needed = (S_ISDIR(found.st_mode) ? 0111 : 0) | (way == real ? 0444 : 0);
+    if ((found.st_mode & needed) != needed) return way;
   }
   return {};
 }
@@ -94,7 +89,7 @@ std::optional<std::filesystem::path> resolve_inside(const std::filesystem::path&
       if (way.empty()) return {};
       way = way.parent_path();
     } else if (const std::filesystem::path target = link_target(top / way / name); target.empty()) {
-      if (!is_there(top / way / name)) return {};
+      if (!is_there(top / way / name) && errno != EACCES) return {};
       if (name != ".") way /= name;
     } else {
       if (target.is_absolute() || --links_left == 0) return {};

@@ -39,7 +39,8 @@ void check(bool done, const std::string& path);
 
 /// Where `inside`, a path relative to the directory `top`, leads. Its links are followed one by
 /// one, and none may leave `top`, not even to come back: then it leads to the same wherever `top`
-/// is. Nothing where it leads out, nowhere, or round in a circle.
+/// is. Nothing where it leads out, nowhere, or round in a circle; where the caller cannot look, no
+/// link is taken for one.
 [[nodiscard]] std::optional<std::filesystem::path> resolve_inside(
     const std::filesystem::path& top, const std::filesystem::path& inside);
 

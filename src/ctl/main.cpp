@@ -107,7 +107,7 @@ outcome run_or_explain(const words& line) {
   } catch (const std::exception& failure) {
     complain(fault(failure.what()));
   } catch (int error) {
-    complain_all(take_reports());
+    complain_all(reports());
     return status_of(error);
   }
   return outcome::failed;

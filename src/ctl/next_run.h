@@ -35,7 +35,7 @@ struct next_run {
   bool operator==(const next_run& other) const = default;
 };
 
-/// Reads the device as a run does. Prints nothing; see `take_reports`.
+/// Reads the device as a run does. Prints nothing.
 [[nodiscard]] run_view read_as_a_run();
 
 /// What a run that reads this does. It has the decisions of `select_dataset`, in its order.

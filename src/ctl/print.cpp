@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstddef>
 #include <iostream>
+#include <set>
 
 namespace {
 
@@ -25,10 +26,11 @@ void complain(const fault& one) {
 
 void complain_all(const faults& all) {
   constexpr std::size_t limit = 20;
-  const std::size_t shown = std::min(all.size(), limit);
-  for (std::size_t i = 0; i < shown; ++i) complain(all[i]);
-  if (shown < all.size())
-    complain(fault("%s more lines like these", {std::to_string(all.size() - shown)}));
+  std::set<std::string> told;
+  for (const fault& one : all)
+    if (told.insert(one.what).second && told.size() <= limit) complain(one);
+  if (told.size() > limit)
+    complain(fault("%s more lines like these", {std::to_string(told.size() - limit)}));
 }
 
 outcome refuse(const refusal& why) {

@@ -13,7 +13,7 @@ void say(const std::string& text);
 /// Prints "kestrelctl: WHAT" or "kestrelctl: WHAT: CURE" on standard error as a line.
 void complain(const fault& one);
 
-/// Prints the first twenty, and how many more there are.
+/// Prints the first twenty, none of them twice, and how many more there are.
 void complain_all(const faults& all);
 
 /// Prints the reasons and gives the status.

@@ -61,18 +61,12 @@ std::string copy_to_keep(const device& now, const ways_back& ways,
   return kept.empty() ? withdrawn : kept;
 }
 
-/// Why nobody knows which copies are good.
-faults faults_of_judgement(const device& now) {
-  if (now.view.is_uncertain) return {fault("the device cannot be read", {}, "start again")};
-  return is_blind(now) || !faults_of_ground(now).empty() ? faults_of(now) : faults();
-}
-
 }  // namespace
 
 outcome prune() {
   const device now = read_device();
-  if (const faults found = faults_of_judgement(now); !found.empty())
-    return refuse({outcome::failed, found});
+  // Otherwise nobody knows which copies are good.
+  if (!faults_of_ground(now).empty()) return refuse({outcome::failed, faults_of(now)});
   const ways_back ways = find_ways_back(now);
   std::set<std::string> superfluous = unlinked_downloads();
   superfluous.erase(copy_to_keep(now, ways, superfluous));

@@ -3,7 +3,6 @@
 #include <cerrno>
 #include <cstring>
 #include <new>
-#include <utility>
 
 #include "fs/report.h"
 
@@ -16,8 +15,12 @@ faults& kept() {
 
 }  // namespace
 
-faults take_reports() {
-  return std::exchange(kept(), {});
+const faults& reports() {
+  return kept();
+}
+
+void forget_reports() {
+  kept().clear();
 }
 
 namespace fs {

@@ -3,8 +3,11 @@
 #include "ctl/fault.h"
 
 // kestrelctl decides and changes links with kestrel's own functions. In kestrel, `fs::report`
-// prints a line at once. In kestrelctl it keeps the line: what was read is told in other words, and
-// only the lines about a change that failed are printed.
+// prints a line at once. In kestrelctl it keeps the line, and only the lines about a change of a
+// link that failed are printed.
 
-/// The lines since the last call, without "kestrel: ".
-[[nodiscard]] faults take_reports();
+/// The lines that are kept, without "kestrel: ".
+[[nodiscard]] const faults& reports();
+
+/// Keeps none of the lines so far. Called before a link is changed.
+void forget_reports();

@@ -20,7 +20,8 @@ std::string joined(const Versions& versions) {
 }
 
 std::string last_switch() {
-  return link_target(paths::record).empty() ? fs::read_first_word(paths::record) : "";
+  if (!link_target(paths::record).empty()) return {};
+  return read_or_throw(paths::record, [] { return fs::read_first_word(paths::record); });
 }
 
 }  // namespace

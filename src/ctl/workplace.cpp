@@ -12,8 +12,19 @@
 #include <system_error>
 
 #include "ctl/files.h"
+#include "ctl/reports.h"
 #include "fs/operations.h"
 #include "paths.h"
+
+namespace {
+
+/// Whether a link that cannot be made or replaced in one step, with this number, may be made after
+/// a removal: something that is no link is in the way, or the removal makes room.
+bool may_remove_first(int error) {
+  return error == EEXIST || error == ENOSPC || error == EDQUOT;
+}
+
+}  // namespace
 
 void become_storage_owner() {
   struct stat storage {};
@@ -47,7 +58,7 @@ storage_lock::storage_lock()
 }
 
 workshop::workshop() {
-  check(::mkdir(workshop_path, S_IRWXU) == 0, workshop_path);
+  check(::mkdir(workshop_path, 0755) == 0, workshop_path);
 }
 
 workshop::~workshop() {
@@ -64,18 +75,19 @@ bool clear_leftovers() {
 }
 
 void stage_link(const std::string& target, const char* link, const char* staged) {
+  forget_reports();  // what was read is told in other words
   if (fs::stage_symlink(target.c_str(), staged)) return;
   const int error = errno;
   fs::require_room(target.c_str(), link);
   errno = error;
-  check(error == EEXIST || error == ENOSPC || error == EDQUOT, staged);
+  check(may_remove_first(error), staged);
 }
 
 void replace_link(const std::string& target, const char* link, const char* staged) {
   if (fs::is_symlink_to(target.c_str(), link)) return;
   stage_link(target, link, staged);
   if (fs::replace_symlink(target.c_str(), link, staged)) return;
-  check(errno == EISDIR || errno == EEXIST || errno == ENOSPC || errno == EDQUOT, link);
+  check(may_remove_first(errno), link);
   fs::remove(link);
   fs::create_symlink(target.c_str(), link);
 }

@@ -1,6 +1,7 @@
 #include "ctl/commands.h"
 #include "ctl/completeness.h"
 #include "ctl/device.h"
+#include "ctl/diagnosis.h"
 #include "ctl/files.h"
 #include "ctl/print.h"
 #include "ctl/workplace.h"
@@ -10,14 +11,13 @@
 outcome set_zone(const std::string& name) {
   const device now = read_device();
   const std::string localtime = paths::localtime_link;
-  const std::string path = now.view.current_path.value_or("");
+  if (!now.view.current_path) return refuse({outcome::failed, faults_of(now)});
+  const std::string& path = *now.view.current_path;
   if (now.zoneinfo_target != zoneinfo_directory(path) || !has_zone(path, name))
     return refuse({outcome::unusable, {fault("%s is no whole zone of the active copy", {name})}});
   const std::string target = std::string(paths::zoneinfo_link) + "/" + name;
-  if (const std::string closed = closed_part(target); !closed.empty()) {
-    return refuse(
-        {outcome::unusable, {fault("not everyone can read %s", {closed}, "chmod a+rX it")}});
-  }
+  if (const std::string closed = closed_part(target); !closed.empty())
+    return refuse({outcome::unusable, {closed_to_some(closed)}});
   if (is_there(localtime) && now.localtime_target.empty())
     return refuse({outcome::failed, {fault("%s is no link", {localtime}, "remove it")}});
   replace_link(target, paths::localtime_link, paths::new_localtime_link);
