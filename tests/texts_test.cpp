@@ -132,6 +132,7 @@ TEST(Whole, TablesOfAZone) {
   EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 6, 2))) << "an abbreviation behind the table";
   EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 5, 1))) << "an indicator for one of two types";
   EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 5, 0).replace(43, 1, "\5"))) << "a name without an end";
+  EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 0, 2).replace(61, 6, "names!"))) << "no end at all";
   EXPECT_FALSE(is_whole_zone("TZif" + std::string(40, '\0'))) << "no type";
   const std::string second = zone_of(1, 1, 5, 2).replace(4, 1, "2") + "\nUTC0\n";
   EXPECT_FALSE(is_whole_zone(second)) << "a footer without a second block";
@@ -145,6 +146,8 @@ TEST(Whole, Bundles) {
     bundle[big ? 32 + 19 : 32 + 16] = '\6';
     EXPECT_TRUE(is_whole_bundle(bundle)) << big;
     EXPECT_FALSE(is_whole_bundle(std::string(bundle).replace(2, 1, "x"))) << big;
+    EXPECT_FALSE(is_whole_bundle(std::string(bundle).replace(12, 1, "x"))) << big;
+    EXPECT_FALSE(is_whole_bundle(std::string(bundle).replace(big ? 51 : 48, 1, "\4"))) << big;
     EXPECT_EQ(has_byte_order_of("44l", bundle), !big);
     EXPECT_EQ(has_byte_order_of("44e", bundle), big);
     for (std::size_t size = 0; size < bundle.size(); ++size)
