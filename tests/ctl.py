@@ -268,7 +268,7 @@ def test_damaged_downloads(row):
      "not everyone can read $B/zoneinfo/Etc: chmod a+rX it"),
     ("chmod 600 $B/icutz/icutz44l.dat", "chmod 644 $B/icutz/icutz44l.dat; kestrel",
      "not everyone can read $B/icutz/icutz44l.dat: chmod a+rX it", "$LEAVES"),
-    ("chmod 700 tz", "chmod a+rX tz", "not everyone can read $S/tz: chmod a+rX it"),
+    ("kestrelctl back; chmod 700 tz", "chmod a+rX tz", "not everyone can read $S/tz: chmod a+rX it"),
     ("chmod 700 $B/zoneinfo", "chmod a+rX $B/zoneinfo",
      "not everyone can read $B/zoneinfo: chmod a+rX it"),
     ("chmod 700 $B/icutz", "chmod a+rX $B/icutz", "not everyone can read $B/icutz: chmod a+rX it"),
@@ -781,7 +781,8 @@ def test_copies_that_others_can_change():
     publish("2026b")
     os.chmod(STORAGE / "tz/2026b.1.0/zoneinfo/Etc/UTC", 0o666)
     fetch("2026b")
-    for change in ("echo more >zoneinfo/more", "rm -r zoneinfo/more icutz"):
+    for change in ("echo more >zoneinfo/more", "rm -r zoneinfo/more icutz/*.dat",
+                   "touch icutz/icutz44l.dat; ln -sfn Etc/UTC zoneinfo/Japan"):
         subprocess.run(change, shell=True, cwd=FETCHED, check=True)
         said = ctl("publish 2026b.1.0 DIR")
         assert said[1] == 4 and "has other content" in said[0]

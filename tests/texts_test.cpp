@@ -111,7 +111,10 @@ TEST(Whole, Zones) {
   for (std::size_t size = 0; size < zone.size(); ++size)
     EXPECT_FALSE(is_whole_zone(zone.substr(0, size))) << size;
   EXPECT_FALSE(is_whole_zone("x" + zone.substr(1)));
-  EXPECT_FALSE(is_whole_zone(zone.replace(zone.rfind('\n', zone.size() - 2), 1, "x")));
+  EXPECT_FALSE(is_whole_zone(std::string(zone).replace(zone.rfind('\n', zone.size() - 2), 1, "x")));
+  // A first block that says that it is longer than all, where the second one should be.
+  zone.erase(44, zone.find("TZif", 1) - 44).replace(32, 1, "\x7f");
+  EXPECT_FALSE(is_whole_zone(zone));
 }
 
 /// A zone with one transition, two types, the abbreviations "A" and "UTC", and these bytes.

@@ -20,10 +20,8 @@ namespace {
 version_set withdrawn_after(const device& now, const std::string& version) {
   const vela_version target = version_of(version.empty() ? now.system_version : version);
   version_set withdrawn = now.withdrawn.value_or(version_set());
-  const bool is_download_active = !now.view.current_path.value_or("").empty();
-  if (is_download_active && version_of(now.active_version) > target)
-    withdrawn.insert(now.active_version);
-  if (version_of(now.latest_version) > target) withdrawn.insert(now.latest_version);
+  for (const std::string& left : {now.active_version, now.latest_version})
+    if (version_of(left) > target) withdrawn.insert(left);
   withdrawn.erase(version);
   return withdrawn;
 }

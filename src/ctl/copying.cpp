@@ -6,6 +6,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <climits>
@@ -132,19 +133,17 @@ faults copy_directory(const place& from, const place& to, const std::string& nam
   return found;
 }
 
-faults faults_of_owners_below(const place& from) {
-  faults found = faults_of_directory(from);
-  if (!found.empty()) return found;
-  for (const std::string& name : names_in(from)) {
+bool is_safe_below(const place& from) {
+  if (!faults_of_directory(from).empty()) return false;
+  return std::ranges::all_of(names_in(from), [&from](const std::string& name) {
     struct stat entry {};
     check(::fstatat(from.directory, name.c_str(), &entry, AT_SYMLINK_NOFOLLOW) == 0, from / name);
-    if (S_ISREG(entry.st_mode)) append(found, faults_of_owner(entry, from / name));
-    if (!S_ISDIR(entry.st_mode)) continue;
+    if (!S_ISDIR(entry.st_mode))
+      return S_ISLNK(entry.st_mode) || faults_of_owner(entry, from / name).empty();
     const fs::descriptor below(::openat(from.directory, name.c_str(), directory_flags));
     check(below.is_open(), from / name);
-    append(found, faults_of_owners_below({below.get(), from / name, from.levels_left - 1}));
-  }
-  return found;
+    return is_safe_below({below.get(), from / name, from.levels_left - 1});
+  });
 }
 
 /// All that is in a tree: for each path, "/" for a directory, else a link's or a file's content.
@@ -185,10 +184,10 @@ faults copy_download(const std::string& from, const std::string& to) {
   return found;
 }
 
-faults faults_of_ownership(const std::string& path) {
+bool is_safe_from_others(const std::string& path) {
   const fs::descriptor directory(::open(path.c_str(), directory_flags));
   check(directory.is_open(), path);
-  return faults_of_owners_below({directory.get(), path});
+  return is_safe_below({directory.get(), path});
 }
 
 bool are_same(const std::string& one, const std::string& other) {

@@ -15,10 +15,9 @@
 /// copied until then stays.
 [[nodiscard]] faults copy_download(const std::string& from, const std::string& to);
 
-/// What others than root, the caller and the storage's owner can change in the download at `path`:
-/// directories and files that are theirs, or that they can write. No link is followed. Throws
+/// Whether nobody but root and the caller can change what is below the directory at `path`. Throws
 /// std::system_error.
-[[nodiscard]] faults faults_of_ownership(const std::string& path);
+[[nodiscard]] bool is_safe_from_others(const std::string& path);
 
 /// Whether both directories hold the same: names, links and contents. Only regular files are read.
 /// Throws std::system_error.

@@ -30,10 +30,9 @@ device read_device() {
   now.localtime_target = link_target(paths::localtime_link);
   now.system_version = now.view.system ? now.view.system->get_version_string()
                                        : fs::read_first_word(system_version_file) + ".1.0";
-  if (now.view.current_path) {
-    now.active_version =
-        now.view.current_path->empty() ? now.system_version : version_in(*now.view.current_path);
-  }
+  now.active_path = now.view.current_path.value_or("");
+  if (now.view.current_path)
+    now.active_version = now.active_path.empty() ? now.system_version : version_in(now.active_path);
   now.latest_version = version_in(now.latest_target);
   now.system_schema = fs::read_first_word(paths::system_schema);
   const std::string through = std::string(paths::zoneinfo_link) + "/";

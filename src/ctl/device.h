@@ -21,6 +21,7 @@ struct device {
   std::string latest_target;
   std::string localtime_target;
 
+  std::string active_path;     // of the download that is active; empty where none is
   std::string system_version;  // the version texts of the copies, as a run has them
   std::string active_version;  // empty where the zoneinfo link names no copy
   std::string latest_version;  // empty where there is no tz_latest

@@ -35,23 +35,20 @@ faults with_cure(faults all, const std::string& cure) {
 
 /// What helps where the data of the active copy is not good.
 std::string cure_of_data(const device& now) {
-  return now.view.current_path.value_or("").empty()
-             ? repair_image
-             : "publish " + now.active_version + " again, from good data";
+  return now.active_path.empty() ? repair_image
+                                 : "publish " + now.active_version + " again, from good data";
 }
 
 std::string way_back_to(const device& now) {
-  return now.view.current_path.value_or("").empty() ? "kestrelctl back"
-                                                    : "kestrelctl back " + now.active_version;
+  return now.active_path.empty() ? "kestrelctl back" : "kestrelctl back " + now.active_version;
 }
 
 /// What programs and runs read, as far as it is known.
 std::vector<std::string> places_of_copies(const device& now) {
-  std::vector<std::string> places = {paths::system_zoneinfo, system_version_file, paths::system_icu,
-                                     paths::system_schema,   paths::storage,      paths::downloads};
-  for (const auto& path : {now.view.current_path, now.view.latest_path}) {
-    if (path && path->starts_with(paths::downloads))
-      places.insert(places.end(), {*path, zoneinfo_directory(*path), icu_directory(*path)});
+  std::vector<std::string> places = {system_version_file, paths::system_schema, paths::downloads};
+  for (const std::string& path : {now.active_path, now.latest_target}) {
+    if (path.starts_with(paths::downloads))
+      places.insert(places.end(), {zoneinfo_directory(path), icu_directory(path)});
   }
   return places;
 }
@@ -137,7 +134,7 @@ faults faults_of_active_links(const device& now) {
   if (is_other_than_link(paths::zoneinfo_link)) return {};  // see faults_of_link_places
   if (!now.view.current_path)
     return {fault("%s leads to %s, which is no copy", {zoneinfo, now.zoneinfo_target}, start_run)};
-  const std::string& path = *now.view.current_path;
+  const std::string& path = now.active_path;
   if (version_of(now.active_version) == vela_version() || !is_there(zoneinfo_directory(path)))
     return {};  // see faults_of_active
   if (now.zoneinfo_target != zoneinfo_directory(path)) {
@@ -151,7 +148,7 @@ faults faults_of_active_links(const device& now) {
 
 faults faults_of_active(const device& now) {
   if (!now.view.current_path) return {};
-  const std::string& path = *now.view.current_path;
+  const std::string& path = now.active_path;
   if (!path.empty()) {
     const std::string leave = now.latest_target == path
                                   ? std::string(start_run) + ", and remove " + paths::latest_link
@@ -205,9 +202,8 @@ faults faults_of_next_run(const device& now, bool is_last) {
 
 /// What a run has still to do that no other fault is about.
 faults faults_of_remains(const device& now) {
-  const std::string path = now.view.current_path.value_or("");
   faults found;
-  if (fs::is_symlink_to(icu_directory(path).c_str(), paths::new_icu_link))
+  if (fs::is_symlink_to(icu_directory(now.active_path).c_str(), paths::new_icu_link))
     found.push_back(fault("%s is of a run that was killed", {paths::new_icu_link}, start_run));
   if (fs::exists(paths::legacy_icu_link))
     found.push_back(fault("%s is of an older system", {paths::legacy_icu_link}, "remove it"));
@@ -229,8 +225,8 @@ faults faults_of_zone(const device& now) {
     return {fault("%s leads to %s, not into %s",
                   {localtime, now.localtime_target, paths::zoneinfo_link}, choose_zone)};
   }
-  if (!now.view.current_path || has_zone(*now.view.current_path, now.zone)) return {};
-  const std::string tree = zoneinfo_directory(*now.view.current_path);
+  if (!now.view.current_path || has_zone(now.active_path, now.zone)) return {};
+  const std::string tree = zoneinfo_directory(now.active_path);
   if (!is_there(tree) || is_closed_to_us(tree + "/" + now.zone)) return {};  // told already
   return {fault("the local zone %s is not whole in the active copy", {now.zone},
                 has_zone("", now.zone) ? cure_of_data(now) : choose_zone)};

@@ -39,8 +39,8 @@ bool can_change_storage() {
   constexpr unsigned fixed = 0x10U | 0x20U;
   struct statvfs mount {};
   struct statx directory {};
+  static_cast<void>(::statx(AT_FDCWD, paths::storage, 0, 0, &directory));
   return ::statvfs(paths::storage, &mount) == 0 && (mount.f_flag & ST_RDONLY) == 0 &&
-         ::statx(AT_FDCWD, paths::storage, 0, STATX_TYPE, &directory) == 0 &&
          (directory.stx_attributes & fixed) == 0;
 }
 

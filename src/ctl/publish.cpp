@@ -56,8 +56,8 @@ std::optional<refusal> judge_version(const device& now, const candidate& wanted)
     return refuse_for(now.system_version, "the system copy");
   const run_view& view = now.view;
   if (view.current_path == wanted.path) return {};
-  if (view.current_path && view.current && may_stay(*view.current, *view.system) &&
-      is_in_the_way(now.active_version, *view.current_path))
+  if (view.current && may_stay(*view.current, *view.system) &&
+      is_in_the_way(now.active_version, now.active_path))
     return refuse_for(now.active_version, "the active copy");
   if (another_waits(now, wanted.path) && is_in_the_way(now.latest_version, now.latest_target))
     return refuse_for(now.latest_version, "the newest download");
@@ -126,7 +126,7 @@ std::optional<refusal> place_download(const device& now, const candidate& wanted
         outcome::unusable,
         {fault("%s has other content", {wanted.path}, "publish this under a higher version")}};
   }
-  if (!faults_of_ownership(wanted.path).empty()) return add_download(now, wanted);
+  if (!is_safe_from_others(wanted.path)) return add_download(now, wanted);
   return {};
 }
 
@@ -151,7 +151,7 @@ bool run_kestrel() {
   if (child == 0 && ::seteuid(::getuid()) == 0 && ::setegid(::getgid()) == 0) {
     if (is_there("/run/systemd/system"))
       ::execlp("systemctl", "systemctl", "start", "kestrel.service", nullptr);
-    ::execlp(beside.c_str(), "kestrel", nullptr);
+    ::execlp(beside.c_str(), beside.c_str(), nullptr);
   }
   if (child == 0) ::_exit(not_found);
   int status = 0;

@@ -12,7 +12,7 @@ outcome set_zone(const std::string& name) {
   const device now = read_device();
   const std::string localtime = paths::localtime_link;
   if (!now.view.current_path) return refuse({outcome::failed, faults_of(now)});
-  const std::string& path = *now.view.current_path;
+  const std::string& path = now.active_path;
   if (now.zoneinfo_target != zoneinfo_directory(path) || !has_zone(path, name))
     return refuse({outcome::unusable, {fault("%s is no whole zone of the active copy", {name})}});
   const std::string target = std::string(paths::zoneinfo_link) + "/" + name;
