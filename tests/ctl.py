@@ -268,7 +268,8 @@ def test_damaged_downloads(row):
      "not everyone can read $B/zoneinfo/Etc: chmod a+rX it"),
     ("chmod 600 $B/icutz/icutz44l.dat", "chmod 644 $B/icutz/icutz44l.dat; kestrel",
      "not everyone can read $B/icutz/icutz44l.dat: chmod a+rX it", "$LEAVES"),
-    ("kestrelctl back; chmod 700 tz", "chmod a+rX tz", "not everyone can read $S/tz: chmod a+rX it"),
+    ("kestrelctl back; chmod 700 tz", "chmod a+rX tz",
+     "not everyone can read $S/tz: chmod a+rX it"),
     ("chmod 700 $B/zoneinfo", "chmod a+rX $B/zoneinfo",
      "not everyone can read $B/zoneinfo: chmod a+rX it"),
     ("chmod 700 $B/icutz", "chmod a+rX $B/icutz", "not everyone can read $B/icutz: chmod a+rX it"),
@@ -544,6 +545,23 @@ def test_withdrawal(waits, version, withdrawn):
     sh("ln -sfn $S/tz/2026d.1.0 tz_latest" if waits else "")
     assert ctl(f"back {version}") == (f"{version or '2026a.1.0'} is active\n", 0)
     assert f"withdrawn: {withdrawn}\n" in ctl("status")[0] and well() is True
+
+
+# Where the list cannot be written, the way back goes on, and says what a downloader will do.
+def test_withdrawal_that_fails():
+    publish("2026b", "2026c")
+    ctl("back 2026b.1.0")
+    sh("echo 2026a >>withdrawn; mkdir -p withdrawn.new/x")
+    reason = "/var/db/timezone/withdrawn.new: File exists\n"
+    assert ctl("back 2026c.1.0") == ("2026c.1.0 is active\n"
+                                     f"kestrelctl: 2026c.1.0 is still withdrawn: {reason}", 0)
+    sh("rm withdrawn")
+    assert ctl("back 2026b.1.0") == (
+        "2026b.1.0 is active\nkestrelctl: 2026c.1.0 is not withdrawn, and a downloader may "
+        f"publish it again: {reason}", 0)
+    sh("mkdir withdrawn")
+    assert ctl("back 2026b.1.0") == ("2026b.1.0 is active\nkestrelctl: "
+                                     "/var/db/timezone/withdrawn cannot be read: remove it\n", 0)
 
 
 # A copy that is damaged on the device is replaced, whether or not it is active.
@@ -838,8 +856,10 @@ def test_order_of_writes():
 def test_the_run():
     alone = ctl("publish 2026b.1.0 DIR", "env", "PATH=/usr/bin", "bash", "-c",
                 f'exec -a /nowhere/kestrelctl {shutil.which("kestrelctl")} "${{@:2}}"', "bash")
-    assert alone[1] == 1 and "kestrel is neither beside kestrelctl nor in the PATH" in alone[0]
-    assert "2026b.1.0 is not active" in alone[0] and "the next run of kestrel switches" in alone[0]
+    assert alone[1] == 1 and lines_of(alone[0]) == wanted([
+        "kestrel is neither beside kestrelctl nor in the PATH: install it",
+        "2026b.1.0 is not active: see the next lines",
+        "the next run of kestrel switches to $B: $RUN"])
     os.makedirs("/run/systemd/system", exist_ok=True)
     os.makedirs("/tmp/bin", exist_ok=True)
     Path("/tmp/bin/systemctl").write_text("#!/bin/sh\necho $@ >/tmp/asked; kestrel\n")
