@@ -698,8 +698,8 @@ def test_system_copy_that_the_owner_cannot_read():
 
 @several_users
 def test_storage_of_another_user():
-    sh("chown -hR 1234:1234 .")
-    publish("2026b")
+    sh("chown -hR 1234:5678 . $F")
+    assert ctl("publish 2026b.1.0 DIR") == ("2026b.1.0 is active\n", 0)
     assert {os.stat(path).st_uid for path in (STORAGE / "tz").rglob("*")} == {1234}
     record = os.stat(STORAGE / "TZVersionDiffRecord")
     assert (record.st_uid, record.st_gid) == (0, 0)
@@ -721,7 +721,7 @@ def test_storage_of_another_user():
         "kestrelctl: /var/db/timezone/tz/.kestrelctl: File exists\n", 1)
     for line in ("status", "prune"):
         ctl(line, *TRACER)
-        assert re.search(r"setgroups\(0, NULL\) += 0\nsetresgid\(-1, 1234, -1\) += 0\n"
+        assert re.search(r"setgroups\(0, NULL\) += 0\nsetresgid\(-1, 5678, -1\) += 0\n"
                          r"setresuid\(-1, 1234, -1\) += 0", TRACE.read_text())
 
 
@@ -823,9 +823,11 @@ def test_publishing_beside_a_copy_of_another_schema():
     fetch("2099z", STORAGE / "tz/2099z.1.0")
     sh("cd tz/2099z.1.0; mv icutz/icutz44{l,b}.dat; ln -sfn $PWD/zoneinfo $PWD/icutz ../..;"
        "ln -sfn $PWD ../../tz_latest")
-    fetch("2026b")
-    said = ctl("publish 2026b.1.0 DIR")
-    assert said[0].startswith("2026b.1.0 is active\n") and said[1] == 0
+    for release in ("2026b", "2026c"):
+        fetch(release)
+        said = ctl(f"publish {release}.1.0 DIR")
+        assert said[0].startswith(f"{release}.1.0 is active\n") and said[1] == 0
+        sh("ln -sfn $S/tz/2147483648a/zoneinfo zoneinfo")  # which is no version
 
 
 def test_many_faults():
