@@ -446,6 +446,18 @@ def test_what_is_well():
     assert well() is True
 
 
+@pytest.mark.parametrize("attribute", ["i", "a"])
+def test_immutable_storage(attribute):
+    publish("2026b")
+    if sh(f"rm zoneinfo; chattr +{attribute} .").returncode:
+        pytest.skip("this file system has no such attributes")
+    said = ctl("status")
+    sh(f"chattr -{attribute} .")
+    assert lines_of(said[0]) == wanted([
+        "$S/zoneinfo is missing: $RUN", "the next run of kestrel fails: see the other lines",
+        "$S/ is missing, read-only, or append-only: make it a directory that can be changed"])
+
+
 def test_what_status_prints():
     publish("2026b", "2026c")
     ctl("back 2026b.1.0")
@@ -660,7 +672,7 @@ def test_no_room_to_publish():
 def test_prune():
     publish("2026b", "2026c", "2026d")
     sh("ln -s x tz_latest.new; : >withdrawn.new; cp -r tz/2026b.1.0 tz/2025z.1.0;"
-       "mkdir -p tz/.kestrelctl/x tz/lost+found tz/2026e;"
+       "mkdir -p tz/.kestrelctl tz/lost+found tz/2026e;"
        "ln -s 2026b.1.0 tz/2026y; ln -s 2026z tz/2026z; : >tz/2026x; ln -s $PWD/tz/2026e held")
     assert ctl("prune") == ("removed /var/db/timezone/tz/.kestrelctl\n"
                             "removed /var/db/timezone/tz/2025z.1.0\n", 0)
@@ -711,6 +723,9 @@ def test_storage_of_another_user():
     assert "withdrawn: 2026b.1.0 2026d.1.0" in ctl("status")[0]
     fetch("2026c")
     ctl("publish 2026e.1.0 DIR", *AS_OWNER)
+    os.chmod(FETCHED, 0o700)
+    said = ctl("publish 2026f.1.0 DIR", *AS_OWNER)
+    assert said == ("kestrelctl: /tmp/fetched: Permission denied\n", 1)
     said = ctl("prune", "setpriv", "--reuid=4321", "--clear-groups")
     assert said[1] == 1 and "/var/db/timezone/ cannot be changed: Permission denied" in said[0]
     sh("mkdir -p tz/2025y/x tz/.kestrelctl/x")

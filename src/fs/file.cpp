@@ -57,7 +57,6 @@ void write_file(const char* path, std::string_view content) noexcept {
   const bool keeps_mode = ::lstat(path, &old) == 0 && S_ISREG(old.st_mode);
   ::unlink(path);
   const descriptor file(::open(path, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666));
-  if (!file.is_open()) return;
   if (keeps_mode) ::fchmod(file.get(), old.st_mode & 0777);
   [[maybe_unused]] const ssize_t ignored = ::write(file.get(), content.data(), content.size());
 }
