@@ -162,10 +162,7 @@ def wanted(lines):
     ("mv icutz/icutz44l.dat icutz/icutz44b.dat",
      "$F/icutz has schema 44b, and the system copy has 44l"),
     ("rm icutz/icutz44l.dat", "$F/icutz/icutz44l.dat is missing or no file"),
-    ("rm icutz/metaZones.res", "$F/icutz/metaZones.res is missing"),
     ("truncate -s 40 icutz/metaZones.res", "$F/icutz/metaZones.res is not whole"),
-    ("cp /tmp/big icutz/metaZones.res",
-     "$F/icutz/metaZones.res has not the byte order of schema 44l"),
     ("rm -r icutz", "$F/icutz is missing or no directory"),
     ("truncate -s 100 zoneinfo/Asia/Tokyo", "$F/zoneinfo/Japan is not whole",
      "$F/zoneinfo/Asia/Tokyo is not whole", "$F/zoneinfo has not the local zone, Asia/Tokyo"),
@@ -181,8 +178,6 @@ def wanted(lines):
     ("ln -s ../../fetched/zoneinfo/Japan zoneinfo/New", "$F/zoneinfo/New $LEADS_OUT"),
     ("ln -s ../../../2026b.1.0/zoneinfo/Japan zoneinfo/New", "$F/zoneinfo/New $LEADS_OUT"),
     ("ln -s /tmp/fetched/zoneinfo/Japan zoneinfo/New", "$F/zoneinfo/New $LEADS_OUT"),
-    ("ln -s New zoneinfo/New", "$F/zoneinfo/New $LEADS_OUT"),
-    ("mv icutz/metaZones.res .; ln -s ../metaZones.res icutz", "$F/icutz/metaZones.res $LEADS_OUT"),
     ("mkfifo zoneinfo/New", "$F/zoneinfo/New is neither a file, nor a directory, nor a link"),
     pytest.param(
         ("chown 4321 zoneinfo/Etc", "$F/zoneinfo/Etc belongs to another user: chown -R it"),
@@ -196,7 +191,6 @@ def test_damaged_downloads(row):
     damage, *lines = row
     publish("2026b")
     fetch("2026c")
-    Path("/tmp/big").write_bytes(bundle(">"))
     before = found()
     subprocess.run(["bash", "-c", damage], cwd=FETCHED, check=True)
     said = ctl("publish 2026c.1.0 DIR")
@@ -262,8 +256,6 @@ def test_damaged_downloads(row):
      "not everyone can read $B/icutz/x: chmod a+rX it"),
     ("chmod 644 $B/zoneinfo/Etc", "chmod a+rX $B/zoneinfo/Etc",
      "not everyone can read $B/zoneinfo/Etc: chmod a+rX it"),
-    ("chmod 600 $B/zoneinfo/Etc/UTC", "chmod 644 $B/zoneinfo/Etc/UTC",
-     "not everyone can read $B/zoneinfo/Etc/UTC: chmod a+rX it"),
     ("chmod 700 $B/zoneinfo/Etc", "chmod 755 $B/zoneinfo/Etc",
      "not everyone can read $B/zoneinfo/Etc: chmod a+rX it"),
     ("chmod 600 $B/icutz/icutz44l.dat", "chmod 644 $B/icutz/icutz44l.dat; kestrel",
@@ -294,8 +286,6 @@ def test_damaged_downloads(row):
      "$S/icutz.new is of a run that was killed: $RUN"),
     ("rm -r $B", "kestrel; rm tz_latest", "$B is missing: $RUN, and remove $S/tz_latest",
      "$LEAVES"),
-    ("rm -r $B; : >$B", "kestrel; rm tz_latest", "$B is missing: $RUN, and remove $S/tz_latest",
-     "$LEAVES"),
     ("ln -sfn $B zoneinfo", "kestrel", "$S/zoneinfo leads to $B, which is no copy: $RUN",
      "$RETURNS"),
     ("ln -sfn tz/2026b.1.0/zoneinfo zoneinfo", "kestrel",
@@ -310,8 +300,6 @@ def test_damaged_downloads(row):
      "$S/icutz is not that of the active copy: kestrelctl back 2026b.1.0"),
     ("rm icutz; mkdir icutz", "rmdir icutz; kestrelctl back 2026b.1.0",
      "$S/icutz is no link: remove it, and kestrelctl back 2026b.1.0"),
-    ("cp -r $B tz/x; ln -sfn $S/tz/x/zoneinfo zoneinfo; ln -sfn $S/tz/x/icutz icutz", "kestrel",
-     "$S/tz/x has a name that is no version: $RUN", "$RETURNS"),
     ("ln -s $B/icutz icutz.new; rm icutz; mkdir icutz", "rmdir icutz; kestrel",
      "$S/icutz is no link: remove it, and kestrelctl back 2026b.1.0",
      "$S/icutz.new is of a run that was killed: $RUN", "$LEAVES"),
@@ -335,8 +323,6 @@ def test_damaged_downloads(row):
     ("cp -r $B tz/2026c; chmod 700 tz/2026c; ln -sfn $S/tz/2026c tz_latest", "rm tz_latest",
      "not everyone can read $S/tz/2026c: chmod a+rX it",
      "the next run of kestrel switches to $S/tz/2026c: see the other lines"),
-    ("rm tz_latest; touch tz_latest", "rm tz_latest", "$S/tz_latest is no link: remove it",
-     "$LEAVES"),
     ("ln -sfn tz/2026b.1.0 tz_latest", "rm tz_latest",
      "$S/tz_latest leads to tz/2026b.1.0, which is no path of a download: remove $S/tz_latest",
      "$LEAVES"),
@@ -406,9 +392,6 @@ def test_damaged_downloads(row):
      "$LEAVES"),
     ("kestrelctl back; truncate -s 9 $A/Etc/UTC", "cp $B/zoneinfo/Etc/UTC $A/Etc",
      "$A/Etc/UTC is not whole: repair the image"),
-    ("kestrelctl back; echo x >$A/Asia/Tokyo", "cp $B/zoneinfo/Asia/Tokyo $A/Asia",
-     "$A/Japan is not whole: repair the image", "$A/Asia/Tokyo is not whole: repair the image",
-     "the local zone Asia/Tokyo is not whole in the active copy: kestrelctl zone NAME"),
     # The storage.
     ("mv $S $S.old", "mv $S.old $S", "$S/ is missing or no directory: make it one",
      "$S/tz/ is missing or no directory: make it one", "$S/zoneinfo is missing: $RUN",
