@@ -91,8 +91,9 @@ outcome run_line(const words& line) {
   return outcome::done;
 }
 
-/// What a system call that failed with this number leads to.
-outcome status_of(int error) {
+/// What a command that was broken off leads to; `error` is the number of the failed call, or 0.
+outcome explain(const faults& reasons, int error) {
+  complain_all(reasons);
   if (error != ENOSPC && error != EDQUOT) return outcome::failed;
   complain(fault("there is no room", {}, "kestrelctl prune makes some"));
   return outcome::not_now;
@@ -102,15 +103,12 @@ outcome run_or_explain(const words& line) {
   try {
     return run_line(line);
   } catch (const std::system_error& failure) {
-    complain(fault(failure.what()));
-    return status_of(failure.code().value());
+    return explain({fault(failure.what())}, failure.code().value());
   } catch (const std::exception& failure) {
-    complain(fault(failure.what()));
+    return explain({fault(failure.what())}, 0);
   } catch (int error) {
-    complain_all(reports());
-    return status_of(error);
+    return explain(reports(), error);
   }
-  return outcome::failed;
 }
 
 }  // namespace
