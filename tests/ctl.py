@@ -170,7 +170,8 @@ def wanted(lines):
      "$F/zoneinfo/+VERSION is of release , not 2026c"),
     ("echo '# version 2026d' >zoneinfo/tzdata.zi",
      "$F/zoneinfo/tzdata.zi is of release 2026d, not 2026c"),
-    ("echo x >zoneinfo/Etc/UTC", "$F/zoneinfo/Etc/UTC is not whole"),
+    ("echo x | tee zoneinfo/A >zoneinfo/Z", "$F/zoneinfo/A is not whole",
+     "$F/zoneinfo/Z is not whole"),
     ("head -c 60 zoneinfo/Etc/UTC >zoneinfo/New", "$F/zoneinfo/New is not whole"),
     ("rm zoneinfo/Etc/UTC", "$F/zoneinfo/Etc/UTC is missing"),
     ("rm zoneinfo/Etc/UTC; mkdir zoneinfo/Etc/UTC", "$F/zoneinfo/Etc/UTC is missing"),
@@ -420,7 +421,8 @@ def test_status(row):
 # What looks odd and is no fault.
 def test_what_is_well():
     publish("2026b")
-    sh("cd $B; rm zoneinfo/{localtime,tzdata.zi} $A/Etc/UTC; ln -s Asia zoneinfo/Area;"
+    sh("cd $B; rm zoneinfo/localtime $A/Etc/UTC; echo x >zoneinfo/tzdata.zi;"
+       "ln -s Asia zoneinfo/Area;"
        "ln -s metaZones.res icutz/other; mkdir icutz/more; : >icutz/more/x; chmod 600 icutz/more/x;"
        "cp zoneinfo/Etc/UTC /usr/share/x; ln -s /usr/share/x zoneinfo/Own; cp -P zoneinfo/Own $A;"
        "mkdir -p /var/db/icu/kept -m 700 ../other; : >../2026a; : >../../withdrawn;"

@@ -64,7 +64,7 @@ TEST(Texts, NearMisses) {
   EXPECT_THROW(version.parse("2147483648a"), std::out_of_range);
   EXPECT_THROW(version.parse("2022b.7.4294967296"), std::out_of_range);
   EXPECT_EQ(version, (vela_version{2022, "b", 7, -1}));
-  for (const char* name : {"xicutz44l.dat", "icutz44lxdat", "icutz44l.dat.bak"})
+  for (const char* name : {"xicutz44l.dat", "other44l.dat", "icutz44lxdat", "icutz44l.dat.bak"})
     EXPECT_EQ(data_file_schema(name), "") << name;
   EXPECT_THROW(static_cast<void>(dataset_path_from_link("/usr/share/zoneinfo.default/")), int);
 }
