@@ -6,7 +6,6 @@
 #include <filesystem>
 #include <optional>
 #include <sstream>
-#include <system_error>
 
 #include "ctl/bundle.h"
 #include "ctl/files.h"
@@ -16,8 +15,6 @@
 #include "paths.h"
 
 namespace {
-
-using std::filesystem::directory_entry;
 
 /// A copy on the way to its faults.
 struct inspection {
@@ -65,18 +62,23 @@ std::optional<std::filesystem::path> end_of(const std::filesystem::path& top,
   return resolve_inside(top, inside);
 }
 
-/// Where a link leads, a zone, a table or a directory has to be, inside of the copy.
-void inspect_link(inspection& copy, const std::filesystem::path& inside,
-                  const std::filesystem::path& twin) {
-  if (link_target(copy.top / inside) == local_zone) return;
-  const auto end = end_of(copy.top, inside, twin);
+/// Where a link leads, a zone, a table or a directory has to be, inside of the tree, where it is
+/// looked at itself. Only what an image's own link leads to is read here.
+void inspect_link(inspection& copy, const std::filesystem::path& name) {
+  const std::filesystem::path tree = copy.top / copy.tree;
+  const std::filesystem::path inside = copy.tree / name;
+  if (name == "localtime" && link_target(tree / name) == local_zone) return;
+  const auto end = end_of(tree, name, paths::system_zoneinfo / name);
+  const auto is_good_file = [&] {
+    return *end == tree / name ? is_zone_or_table(read_file(*end).value_or(""), has_zone_name(name))
+                               : has_zone_name(*end) || !has_zone_name(name);
+  };
   if (!end) {
     copy.found.push_back(
         fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
   } else if (const std::string closed = closed_part(*end); !closed.empty()) {
     copy.found.push_back(closed_to_some(closed));
-  } else if (!leads_to_directory(*end) &&
-             !is_zone_or_table(read_file(*end).value_or(""), has_zone_name(inside))) {
+  } else if (!leads_to_directory(*end) && !is_good_file()) {
     copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
   }
 }
@@ -88,8 +90,8 @@ bool inspect_top(inspection& copy, const std::filesystem::path& name) {
   } else if (!resolve_inside(copy.top, name)) {
     copy.found.push_back(
         fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(name)}));
-  } else if (!is_open_to_all(std::filesystem::status(copy.top / name))) {
-    copy.found.push_back(closed_to_some(copy.name_of(name)));
+  } else if (const std::string closed = closed_part(copy.top / name); !closed.empty()) {
+    copy.found.push_back(closed_to_some(closed));
   } else {
     return true;
   }
@@ -97,33 +99,35 @@ bool inspect_top(inspection& copy, const std::filesystem::path& name) {
 }
 
 void inspect_tree(inspection& copy) {
-  const std::filesystem::path system = paths::system_zoneinfo;
-  if (!inspect_top(copy, copy.tree)) return;
-  for (const auto& entry : everything_in(copy.top / copy.tree)) {
-    const std::filesystem::path inside = entry.path().lexically_relative(copy.top);
-    const std::filesystem::file_status status = entry.symlink_status();
+  const std::filesystem::path tree = copy.top / copy.tree;
+  auto entry = everything_in(tree);
+  for (; entry != std::filesystem::recursive_directory_iterator(); ++entry) {
+    const std::filesystem::path name = entry->path().lexically_relative(tree);
+    const std::filesystem::path inside = copy.tree / name;
+    const std::filesystem::file_status status = entry->symlink_status();
     if (is_symlink(status)) {
-      inspect_link(copy, inside, system / inside.lexically_relative(copy.tree));
+      inspect_link(copy, name);
     } else if (!is_directory(status) && !is_regular_file(status)) {
       copy.found.push_back(
           fault("%s is neither a file, nor a directory, nor a link", {copy.name_of(inside)}));
     } else if (!is_open_to_all(status)) {
       copy.found.push_back(closed_to_some(copy.name_of(inside)));
+      entry.disable_recursion_pending();
     } else if (is_regular_file(status) &&
-               !is_zone_or_table(read_file(entry.path()).value_or(""), has_zone_name(inside))) {
+               !is_zone_or_table(read_file(entry->path()).value_or(""), has_zone_name(name))) {
       copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
     }
   }
 }
 
 /// Whether the copy has what the system copy has as `theirs`, a file or a directory.
-bool inspect_counterpart(inspection& copy, const directory_entry& theirs,
+bool inspect_counterpart(inspection& copy, const std::filesystem::path& theirs,
                          const std::filesystem::path& inside) {
   const std::filesystem::path ours = copy.top / inside;
   struct stat found {};
   const bool is_found = ::stat(ours.c_str(), &found) == 0;
   check(is_found || !is_hard(errno), ours);
-  const bool is_good = is_found && leads_to_directory(ours) == theirs.is_directory();
+  const bool is_good = is_found && leads_to_directory(ours) == leads_to_directory(theirs);
   // What is closed, and a link that leads nowhere, has its fault already.
   const bool is_told = !is_found && (errno == EACCES || is_there(ours));
   if (!is_good && !is_told) copy.found.push_back(fault("%s is missing", {copy.name_of(inside)}));
@@ -137,8 +141,9 @@ void inspect_missing(inspection& copy) {
   auto theirs = everything_in(system);
   for (; theirs != std::filesystem::recursive_directory_iterator(); ++theirs) {
     const std::filesystem::path name = theirs->path().lexically_relative(system);
-    if (name == "+VERSION" || (theirs->is_symlink() && !resolve_inside(system, name))) continue;
-    if (!inspect_counterpart(copy, *theirs, copy.tree / name)) theirs.disable_recursion_pending();
+    if (name == "+VERSION" || !resolve_inside(system, name)) continue;
+    if (!inspect_counterpart(copy, theirs->path(), copy.tree / name))
+      theirs.disable_recursion_pending();
   }
 }
 
@@ -176,17 +181,19 @@ void inspect_schema(inspection& copy) {
   }
 }
 
-/// Whether everyone can read what is in the directory.
+/// Whether everyone can read what is in the directory, and no link leads out of it.
 bool inspect_modes_of_bundles(inspection& copy) {
   const std::size_t before = copy.found.size();
-  for (const auto& entry : std::filesystem::directory_iterator(copy.top / "icutz")) {
-    const std::filesystem::path inside = entry.path().lexically_relative(copy.top);
-    const std::filesystem::file_status status = entry.symlink_status();
-    if (is_symlink(status) && !resolve_inside(copy.top, inside)) {
+  auto entry = everything_in(copy.top / "icutz");
+  for (; entry != std::filesystem::recursive_directory_iterator(); ++entry) {
+    const std::filesystem::path inside = entry->path().lexically_relative(copy.top);
+    const auto end = resolve_inside(copy.top, inside);
+    if (!end) {
       copy.found.push_back(
           fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
-    } else if (!is_symlink(status) && !is_open_to_all(status)) {
-      copy.found.push_back(closed_to_some(copy.name_of(inside)));
+    } else if (const std::string closed = closed_part(*end);
+               entry.depth() == 0 && !closed.empty()) {
+      copy.found.push_back(closed_to_some(closed));
     }
   }
   return copy.found.size() == before;
@@ -216,15 +223,13 @@ faults faults_of_copy(const std::string& path, const std::string& version,
                       const std::string& shown) {
   inspection copy{path, "zoneinfo", shown, schema_of("")};
   if (!path.empty() && !inspect_top(copy, "")) return copy.found;
-  if (path.empty()) {
-    copy = {paths::system_zoneinfo, "", paths::system_zoneinfo, copy.schema};
+  if (path.empty()) copy = {paths::system_zoneinfo, "", paths::system_zoneinfo, copy.schema};
+  if (inspect_top(copy, copy.tree)) {
     inspect_tree(copy);
-  } else {
-    inspect_tree(copy);
-    inspect_missing(copy);
-    inspect_bundles(copy);
+    if (!path.empty()) inspect_missing(copy);
+    inspect_release(copy, version);
   }
-  inspect_release(copy, version);
+  if (!path.empty()) inspect_bundles(copy);
   return copy.found;
 }
 

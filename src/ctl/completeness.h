@@ -9,9 +9,10 @@
 ///
 /// Looked at is every entry of the tree: that each file with a zone's name is a whole zone and no
 /// other one is empty, that everyone can read it, and that each link leads to such a file or to a
-/// directory, inside of the copy (an absolute link that the image has too is the image's own). In a
-/// download also: the release in "+VERSION" and "tzdata.zi", the schema, the four bundles with
-/// their byte order, and that nothing is missing that the system copy has.
+/// directory, inside of the tree. An absolute link that the image has too is the image's own, and
+/// "localtime" may lead to /etc/localtime. Also the release in "+VERSION" and "tzdata.zi". In a
+/// download also: the schema, the four bundles with their byte order, that no link in "icutz" leads
+/// out of the download, and that nothing is missing that the system copy has.
 ///
 /// A fault has a cure of its own where other modes are enough; otherwise the data has to come anew.
 /// Throws std::system_error where the disk or the system fails.

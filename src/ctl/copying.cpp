@@ -14,7 +14,6 @@
 #include <filesystem>
 #include <map>
 #include <memory>
-#include <system_error>
 #include <vector>
 
 #include "ctl/files.h"

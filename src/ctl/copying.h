@@ -7,9 +7,8 @@
 /// Copies "zoneinfo" and "icutz" of the download in the directory `from` into the directory `to`,
 /// which is not there yet. Directories get mode 0755, files 0644, both less the umask. Gives what
 /// may not be copied:
-/// - a directory that is owned by another than root or the storage's owner, or that
-///   others than its owner can write: they could put a link to somebody else's file there
-///   meanwhile;
+/// - a directory that is owned by another than root or the caller, or that others than its owner
+///   can write: they could put a link to somebody else's file there meanwhile;
 /// - what is neither a file, nor a directory, nor a link.
 /// No link of the download is followed. Throws std::system_error on every other failure. What was
 /// copied until then stays.

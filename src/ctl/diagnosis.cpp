@@ -45,9 +45,11 @@ std::string way_back_to(const device& now) {
 
 /// What programs and runs read, as far as it is known.
 std::vector<std::string> places_of_copies(const device& now) {
-  std::vector<std::string> places = {system_version_file, paths::system_schema, paths::downloads};
-  for (const std::string& path : {now.active_path, now.latest_target}) {
-    if (path.starts_with(paths::downloads))
+  std::vector<std::string> places = {system_version_file, paths::system_schema, paths::storage,
+                                     paths::downloads};
+  for (const std::string& version : {now.active_version, now.latest_version}) {
+    const std::string path = path_of(version);
+    if (version_of(version) != vela_version())
       places.insert(places.end(), {zoneinfo_directory(path), icu_directory(path)});
   }
   return places;
@@ -210,7 +212,7 @@ faults faults_of_remains(const device& now) {
   std::error_code error;
   const bool is_in_use =
       std::filesystem::is_directory(std::filesystem::symlink_status(paths::legacy_icu, error)) &&
-      !std::filesystem::is_empty(paths::legacy_icu, error);
+      !std::filesystem::is_empty(paths::legacy_icu, error) && !error;
   if (is_there(paths::legacy_icu) && !is_in_use)
     found.push_back(fault("%s is of an older system", {paths::legacy_icu}, "remove it"));
   return found;
@@ -227,7 +229,9 @@ faults faults_of_zone(const device& now) {
   }
   if (!now.view.current_path || has_zone(now.active_path, now.zone)) return {};
   const std::string tree = zoneinfo_directory(now.active_path);
-  if (!is_there(tree) || is_closed_to_us(tree + "/" + now.zone)) return {};  // told already
+  if (!is_there(tree)) return {};  // see faults_of_active
+  if (const std::string closed = closed_part(tree + "/" + now.zone); !closed.empty())
+    return {closed_to_some(closed)};
   return {fault("the local zone %s is not whole in the active copy", {now.zone},
                 has_zone("", now.zone) ? cure_of_data(now) : choose_zone)};
 }
@@ -249,8 +253,13 @@ faults faults_of(const device& now) {
   if (is_blind(now)) return found;
   for (const auto& subject :
        {faults_of_system, faults_of_link_places, faults_of_list, faults_of_active_links,
-        faults_of_active, faults_of_latest, faults_of_remains, faults_of_zone})
-    append(found, subject(now));
+        faults_of_active, faults_of_latest, faults_of_remains, faults_of_zone}) {
+    try {
+      append(found, subject(now));
+    } catch (const std::system_error& failure) {
+      found.push_back(fault("the device cannot be read", {}, failure.what()));
+    }
+  }
   append(found, faults_of_next_run(now, found.empty()));
   append(found, faults_of_entrance("/etc/localtime", paths::localtime_link));
   append(found, faults_of_entrance(paths::legacy_zoneinfo, paths::zoneinfo_link));
@@ -292,8 +301,6 @@ faults faults_of_way_back(const device& now, const std::string& version) {
     const vela_dataset copy = read_or_throw(path, [&path] { return vela_dataset(path); });
     found = faults_of_fitness(now, path, copy);
     if (found.empty()) found = faults_of_copy(path, version, path);
-    if (const std::string closed = closed_part(path); found.empty() && !closed.empty())
-      found.push_back(closed_to_some(closed));
   }
   if (found.empty() && !now.zone.empty() && !has_zone(path, now.zone))
     found.push_back(fault("%s has not the local zone, %s", {zoneinfo_directory(path), now.zone}));
@@ -310,7 +317,8 @@ ways_back find_ways_back(const device& now) {
     } catch (const std::system_error& failure) {
       found.unread.insert(version);
       found.reasons.push_back(
-          fault("%s cannot be read: %s", {entry.path(), failure.what()}, "remove it"));
+          fault("%s cannot be read: %s", {entry.path(), failure.what()},
+                entry.path() == now.active_path ? cure_of_data(now) : "remove it"));
     }
   }
   std::ranges::sort(found.accepted, [](const std::string& one, const std::string& other) {

@@ -1,7 +1,6 @@
 #include <filesystem>
 #include <set>
 #include <system_error>
-#include <vector>
 
 #include "ctl/commands.h"
 #include "ctl/device.h"
@@ -56,7 +55,7 @@ std::string copy_to_keep(const device& now, const ways_back& ways,
   std::string withdrawn;
   for (const std::string& version : ways.accepted) {  // the newest comes last
     if (!versions.contains(version)) continue;
-    (now.withdrawn && now.withdrawn->contains(version) ? withdrawn : kept) = version;
+    (now.withdrawn->contains(version) ? withdrawn : kept) = version;
   }
   return kept.empty() ? withdrawn : kept;
 }

@@ -147,10 +147,10 @@ bool run_kestrel() {
   constexpr int not_found = 127;
   const std::string beside =
       std::filesystem::path(program_invocation_name).replace_filename("kestrel");
+  const bool has_manager = is_there("/run/systemd/system");
   const pid_t child = ::fork();
   if (child == 0 && ::seteuid(::getuid()) == 0 && ::setegid(::getgid()) == 0) {
-    if (is_there("/run/systemd/system"))
-      ::execlp("systemctl", "systemctl", "start", "kestrel.service", nullptr);
+    if (has_manager) ::execlp("systemctl", "systemctl", "start", "kestrel.service", nullptr);
     ::execlp(beside.c_str(), beside.c_str(), nullptr);
   }
   if (child == 0) ::_exit(not_found);

@@ -26,6 +26,7 @@ void forget_reports() {
 namespace fs {
 
 void report(int error, std::string_view format, std::initializer_list<const char*> texts) noexcept {
+  if (error == 0) return;
   const int saved_errno = errno;
   try {
     const std::vector<std::string> copies(texts.begin(), texts.end());

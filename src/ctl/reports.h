@@ -3,8 +3,8 @@
 #include "ctl/fault.h"
 
 // kestrelctl decides and changes links with kestrel's own functions. In kestrel, `fs::report`
-// prints a line at once. In kestrelctl it keeps the line, and only the lines about a change of a
-// link that failed are printed.
+// prints a line at once. In kestrelctl it keeps the lines about calls that failed, and only those
+// about a change of a link are printed.
 
 /// The lines that are kept, without "kestrel: ".
 [[nodiscard]] const faults& reports();

@@ -62,9 +62,9 @@ class workshop final {
 /// some. Throws `int` where there is no room, and std::system_error for all else.
 void stage_link(const std::string& target, const char* link, const char* staged);
 
-/// Makes `link` a link to `target`, staged at `staged`: in one step or, where something that is no
-/// link is at one of the two, or a removal makes room, by a removal and a creation. Throws what
-/// `stage_link` does, and `int`.
+/// Makes `link`, which is no directory, a link to `target`, staged at `staged`: in one step or,
+/// where something that is no link is at `staged`, or a removal makes room, by a removal and a
+/// creation. Throws what `stage_link` does, and `int`.
 void replace_link(const std::string& target, const char* link, const char* staged);
 
 /// Writes all that the file system of `directory` holds to the disk. Throws std::system_error.
