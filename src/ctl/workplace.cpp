@@ -28,7 +28,7 @@ bool may_remove_first(int error) {
 
 void become_storage_owner() {
   struct stat storage {};
-  if (::geteuid() != 0 || ::stat(paths::storage, &storage) != 0) return;
+  if (::geteuid() != 0 || ::stat(paths::storage, &storage) != 0 || storage.st_uid == 0) return;
   check(::setgroups(0, nullptr) == 0 && ::setegid(storage.st_gid) == 0 &&
             ::seteuid(storage.st_uid) == 0,
         paths::storage);

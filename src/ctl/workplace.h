@@ -15,8 +15,8 @@ inline constexpr const char* new_download = "/var/db/timezone/tz/.kestrelctl/dow
 inline constexpr const char* new_latest_link = "/var/db/timezone/tz_latest.new";
 inline constexpr const char* new_withdrawn_list = "/var/db/timezone/withdrawn.new";
 
-/// As root, continues as the owner of the storage: nothing that this owner has put there leads to a
-/// file of root's then. Does nothing for other users. Throws std::system_error where it cannot.
+/// As root, continues as the owner of the storage, if that is another user: nothing that this owner
+/// has put there leads to a file of root's then. Throws std::system_error where it cannot.
 void become_storage_owner();
 
 /// Why the caller cannot safely change the storage: it is missing or not the caller's, or, for
