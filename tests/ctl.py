@@ -78,6 +78,7 @@ def publish(*releases):
         assert ctl(f"publish {release}.1.0 DIR") == (f"{release}.1.0 is active\n", 0)
 
 
+REMOUNT = "mount --options-source=disable -o remount"
 STRICTLY = ["sh", "-c", 'umask 077; exec "$0" "$@"']
 
 
@@ -442,11 +443,10 @@ def test_what_is_well():
     assert well() is True
 
 
-REMOUNT = "mount --options-source=disable -o remount"
 @pytest.mark.parametrize("close, reopen", [("chattr +i .", "chattr -i ."),
                                            ("chattr +a .", "chattr -a ."),
                                            (f"{REMOUNT},ro /var", f"{REMOUNT},rw /var")])
-def test_immutable_storage(close, reopen):
+def test_storage_that_cannot_change(close, reopen):
     publish("2026b")
     if sh(f"rm zoneinfo; {close}").returncode:
         pytest.skip("this file system, or this user, cannot")
@@ -645,11 +645,10 @@ def test_interrupted(line):
 def test_full_storage(line, said, limit):
     publish("2026b", "2026c")
     shutil.copytree(STORAGE / "tz/2026b.1.0", STORAGE / "tz/2025z.1.0")
-    remount = "mount --options-source=disable -o remount,"
-    if sh(f"{remount}{limit} /var").returncode:
+    if sh(f"{REMOUNT},{limit} /var").returncode:
         pytest.skip("only root can remount")
     ended = ctl(line)
-    sh(f"{remount}nr_inodes=1000000,size=50% /var")
+    sh(f"{REMOUNT},nr_inodes=1000000,size=50% /var")
     assert ended[1] == 0 and said in ended[0], ended
     assert ("is not withdrawn" in ended[0]) == line.startswith("back"), ended
     assert well() is True
@@ -658,12 +657,11 @@ def test_full_storage(line, said, limit):
 def test_no_room_to_publish():
     publish("2026b")
     fetch("2026c")
-    if sh("mount --options-source=disable -o remount,nr_inodes="
-          "$(($(df --output=iused /var | tail -n 1))) /var").returncode:
+    if sh(f"{REMOUNT},nr_inodes=$(($(df --output=iused /var | tail -n 1))) /var").returncode:
         pytest.skip("only root can remount")
     before = found()
     said = ctl("publish 2026c.1.0 DIR")
-    sh("mount --options-source=disable -o remount,nr_inodes=1000000 /var")
+    sh(f"{REMOUNT},nr_inodes=1000000 /var")
     assert said[0].endswith("there is no room: kestrelctl prune makes some\n") and said[1] == 5
     assert found() == before
 

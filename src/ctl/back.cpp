@@ -5,7 +5,6 @@
 #include "ctl/diagnosis.h"
 #include "ctl/files.h"
 #include "ctl/print.h"
-#include "ctl/reports.h"
 #include "ctl/withdrawn.h"
 #include "ctl/workplace.h"
 #include "dataset/vela_dataset.h"
@@ -72,7 +71,6 @@ outcome go_back(const std::string& version) {
     if (!path.empty()) stage_link(icu_directory(path), paths::icu_link, paths::new_icu_link);
   }
   withdraw(now, withdrawn_after(now, version));
-  forget_reports();
   name_newest(path);  // before the rest, so that no run in between undoes that
   if (!is_done) vela_dataset(path).activate();
   sync_file_system(paths::storage);

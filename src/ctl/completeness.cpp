@@ -38,6 +38,14 @@ bool is_open_to_all(const std::filesystem::file_status& status) {
   return (status.permissions() & needed) == needed;
 }
 
+fault leads_out(const std::string& path) {
+  return fault("%s is a link that leads out of the copy or nowhere", {path});
+}
+
+fault not_whole(const std::string& path) {
+  return fault("%s is not whole", {path});
+}
+
 /// The names of zones begin with capital letters, those of tables do not.
 bool has_zone_name(const std::filesystem::path& entry) {
   const char first = entry.filename().string().front();
@@ -74,12 +82,11 @@ void inspect_link(inspection& copy, const std::filesystem::path& name) {
                                : has_zone_name(*end) || !has_zone_name(name);
   };
   if (!end) {
-    copy.found.push_back(
-        fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
+    copy.found.push_back(leads_out(copy.name_of(inside)));
   } else if (const std::string closed = closed_part(*end); !closed.empty()) {
     copy.found.push_back(closed_to_some(closed));
   } else if (!leads_to_directory(*end) && !is_good_file()) {
-    copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
+    copy.found.push_back(not_whole(copy.name_of(inside)));
   }
 }
 
@@ -88,8 +95,7 @@ bool inspect_top(inspection& copy, const std::filesystem::path& name) {
   if (!leads_to_directory(copy.top / name)) {
     copy.found.push_back(fault("%s is missing or no directory", {copy.name_of(name)}));
   } else if (!resolve_inside(copy.top, name)) {
-    copy.found.push_back(
-        fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(name)}));
+    copy.found.push_back(leads_out(copy.name_of(name)));
   } else if (const std::string closed = closed_part(copy.top / name); !closed.empty()) {
     copy.found.push_back(closed_to_some(closed));
   } else {
@@ -115,7 +121,7 @@ void inspect_tree(inspection& copy) {
       entry.disable_recursion_pending();
     } else if (is_regular_file(status) &&
                !is_zone_or_table(read_file(entry->path()).value_or(""), has_zone_name(name))) {
-      copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
+      copy.found.push_back(not_whole(copy.name_of(inside)));
     }
   }
 }
@@ -182,18 +188,17 @@ void inspect_schema(inspection& copy) {
 }
 
 /// Whether everyone can read what is in the directory, and no link leads out of it.
-bool inspect_modes_of_bundles(inspection& copy) {
+bool inspect_bundle_directory(inspection& copy) {
   const std::size_t before = copy.found.size();
   auto entry = everything_in(copy.top / "icutz");
   for (; entry != std::filesystem::recursive_directory_iterator(); ++entry) {
     const std::filesystem::path inside = entry->path().lexically_relative(copy.top);
     const auto end = resolve_inside(copy.top, inside);
     if (!end) {
-      copy.found.push_back(
-          fault("%s is a link that leads out of the copy or nowhere", {copy.name_of(inside)}));
-    } else if (const std::string closed = closed_part(*end);
-               entry.depth() == 0 && !closed.empty()) {
-      copy.found.push_back(closed_to_some(closed));
+      copy.found.push_back(leads_out(copy.name_of(inside)));
+    } else if (entry.depth() == 0) {  // ICU reads nothing below
+      const std::string closed = closed_part(*end);
+      if (!closed.empty()) copy.found.push_back(closed_to_some(closed));
     }
   }
   return copy.found.size() == before;
@@ -201,7 +206,7 @@ bool inspect_modes_of_bundles(inspection& copy) {
 
 void inspect_bundles(inspection& copy) {
   // Without a schema, the system copy is at fault, which is told elsewhere.
-  if (!inspect_top(copy, "icutz") || !inspect_modes_of_bundles(copy) || copy.schema.empty()) return;
+  if (!inspect_top(copy, "icutz") || !inspect_bundle_directory(copy) || copy.schema.empty()) return;
   inspect_schema(copy);
   for (const std::string name : {"zoneinfo64", "metaZones", "timezoneTypes", "windowsZones"}) {
     const std::filesystem::path inside = "icutz/" + name + ".res";
@@ -209,7 +214,7 @@ void inspect_bundles(inspection& copy) {
     if (!is_there(copy.top / inside)) {
       copy.found.push_back(fault("%s is missing", {copy.name_of(inside)}));
     } else if (!is_whole_bundle(content)) {
-      copy.found.push_back(fault("%s is not whole", {copy.name_of(inside)}));
+      copy.found.push_back(not_whole(copy.name_of(inside)));
     } else if (!has_byte_order_of(copy.schema, content)) {
       copy.found.push_back(
           fault("%s has not the byte order of schema %s", {copy.name_of(inside), copy.schema}));

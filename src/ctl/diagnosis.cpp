@@ -138,7 +138,7 @@ faults faults_of_active_links(const device& now) {
     return {fault("%s leads to %s, which is no copy", {zoneinfo, now.zoneinfo_target}, start_run)};
   const std::string& path = now.active_path;
   if (version_of(now.active_version) == vela_version() || !is_there(zoneinfo_directory(path)))
-    return {};  // see faults_of_active
+    return {};  // see faults_of_active and faults_of_system
   if (now.zoneinfo_target != zoneinfo_directory(path)) {
     return {fault("%s leads to %s, which no program expects", {zoneinfo, now.zoneinfo_target},
                   way_back_to(now))};

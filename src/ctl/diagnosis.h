@@ -8,7 +8,8 @@
 #include "ctl/fault.h"
 
 /// What is wrong with the device. Empty only where every program reads whole data through libc and
-/// ICU, and the next run changes nothing. Where `is_blind`, only what not everyone can read.
+/// ICU, and the next run changes nothing. Where `is_blind`, only what not everyone
+/// can read, and places that are missing.
 [[nodiscard]] faults faults_of(const device& now);
 
 /// Whether the caller cannot read the copies, so that what was read of the device is not true.

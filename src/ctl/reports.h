@@ -9,5 +9,5 @@
 /// The lines that are kept, without "kestrel: ".
 [[nodiscard]] const faults& reports();
 
-/// Keeps none of the lines so far. Called before a link is changed.
+/// Keeps none of the lines so far. `stage_link` calls it, before a link is changed.
 void forget_reports();
