@@ -90,9 +90,6 @@ void vela_icu::activate() const {
   } catch (...) {
     fs::report(errno, "unlink of ICU softlink failed");
   }
-  if (!is_download) {
-    fs::unstage_symlink(paths::new_icu_link);
-  } else if (!replaced) {
-    fs::create_symlink(data, paths::icu_link);
-  }
+  if (!is_download) fs::unstage_symlink(paths::new_icu_link);
+  if (is_download && !replaced) fs::create_symlink(data, paths::icu_link);
 }

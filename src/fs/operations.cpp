@@ -23,9 +23,9 @@ bool removing_makes_room() noexcept {
   constexpr long ext4 = 0xef53;
   const int error = errno;
   struct statfs storage {};
-  const bool known = ::statfs(paths::storage, &storage) == 0;
+  static_cast<void>(::statfs(paths::storage, &storage));
   errno = error;
-  return known && (storage.f_type == tmpfs || storage.f_type == ext4) && storage.f_files > 0 &&
+  return (storage.f_type == tmpfs || storage.f_type == ext4) && storage.f_files != 0 &&
          storage.f_ffree == 0;
 }
 
@@ -49,7 +49,7 @@ bool exists(const char* path) noexcept {
 std::string read_symlink(const char* path) {
   std::array<char, 1024> content;
   const ssize_t length = ::readlink(path, content.data(), content.size());
-  if (length >= 0) return {content.data(), static_cast<std::size_t>(length)};
+  if (length != -1) return {content.data(), static_cast<std::size_t>(length)};
   if (errno == ENOENT) return {};
   fail("read_symlink: %s", {path});
 }
@@ -60,18 +60,20 @@ void create_symlink(const char* target, const char* link) {
 
 bool is_symlink_to(const char* target, const char* link) noexcept {
   const int error = errno;
-  std::array<char, PATH_MAX> content;
-  const ssize_t length = ::readlink(link, content.data(), content.size());
+  std::array<char, PATH_MAX> content{};  // NULs behind what is read: every link is shorter
+  [[maybe_unused]] const ssize_t ignored = ::readlink(link, content.data(), content.size());
   errno = error;
-  return length >= 0 &&
-         std::string_view(content.data(), static_cast<std::size_t>(length)) == target;
+  return std::string_view(content.data()) == target;
 }
 
 bool stage_symlink(const char* target, const char* staged) noexcept {
-  if (::symlink(target, staged) == 0 || is_symlink_to(target, staged)) return true;
+  const auto stands = [target, staged] {
+    return ::symlink(target, staged) == 0 || is_symlink_to(target, staged);
+  };
+  if (stands()) return true;
   if (errno != EEXIST) return false;
   unstage_symlink(staged);
-  return ::symlink(target, staged) == 0 || is_symlink_to(target, staged);
+  return stands();
 }
 
 void unstage_symlink(const char* staged) noexcept {
