@@ -212,7 +212,7 @@ faults faults_of_remains(const device& now) {
   std::error_code error;
   const bool is_in_use =
       std::filesystem::is_directory(std::filesystem::symlink_status(paths::legacy_icu, error)) &&
-      !std::filesystem::is_empty(paths::legacy_icu, error) && !error;
+      !std::filesystem::is_empty(paths::legacy_icu, error);
   if (is_there(paths::legacy_icu) && !is_in_use)
     found.push_back(fault("%s is of an older system", {paths::legacy_icu}, "remove it"));
   return found;

@@ -22,7 +22,7 @@ auto attempt(run_view& view, Read read) -> std::optional<decltype(read())> {
   try {
     result = read();
   } catch (...) {
-    result.reset();
+    // A run would end here, or go back.
   }
   view.is_uncertain |= is_hard(errno);
   return result;
@@ -49,9 +49,9 @@ std::optional<std::string> chosen_path(const run_view& view) {
   const std::string system;
   if (!view.latest_path || !view.current) return system;
   const bool stays = view.current_path && may_stay(*view.current, *view.system);
-  // Then the run throws before it looks at the latest dataset.
+  // A run that cannot finish throws before it looks at the latest dataset.
   const bool can_finish = view.can_change_storage && !view.is_icutz_directory;
-  if (stays && view.has_to_finish && !can_finish) return system;
+  if (view.has_to_finish && !can_finish) return system;
   if (!view.latest_path->empty()) {
     if (!view.latest) return system;
     if (may_replace(*view.latest, *view.current, *view.system)) return view.latest_path;

@@ -25,7 +25,7 @@ std::optional<version_set> read_withdrawn() {
 
 void write_withdrawn(const version_set& versions) {
   if (versions.empty()) {
-    check(::unlink(withdrawn_list) == 0 || errno == ENOENT, withdrawn_list);
+    check(::unlink(withdrawn_list) == 0, withdrawn_list);
     return;
   }
   std::string lines;
