@@ -268,14 +268,10 @@ def test_damaged_downloads(row):
      "not everyone can read $B/zoneinfo/Etc: chmod a+rX it"),
     ("chmod 600 $B/icutz/icutz44l.dat", "chmod 644 $B/icutz/icutz44l.dat; kestrel",
      "not everyone can read $B/icutz/icutz44l.dat: chmod a+rX it", "$LEAVES"),
-    ("kestrelctl back; chmod 700 tz", "chmod a+rX tz",
+    ("kestrelctl back; chmod 711 tz", "chmod a+rX tz",
      "not everyone can read $S/tz: chmod a+rX it"),
-    ("chmod 700 $B/zoneinfo", "chmod a+rX $B/zoneinfo",
-     "not everyone can read $B/zoneinfo: chmod a+rX it"),
-    ("chmod 700 $B/icutz", "chmod a+rX $B/icutz", "not everyone can read $B/icutz: chmod a+rX it"),
     ("chmod 711 $B/zoneinfo/Asia", "chmod 755 $B/zoneinfo/Asia",
      "not everyone can read $B/zoneinfo/Asia: chmod a+rX it"),
-    ("chmod 700 $B", "chmod a+rX $B", "not everyone can read $B: chmod a+rX it"),
     ("mkdir $B/icutz/x; mv $B/icutz/*.res $B/icutz/x; "
      "cd $B/icutz; ln -s x/* .; chmod 600 x/metaZones.res", "chmod a+rX $B/icutz/x/metaZones.res",
      "not everyone can read $B/icutz/x/metaZones.res: chmod a+rX it"),
@@ -297,8 +293,6 @@ def test_damaged_downloads(row):
      "$S/icutz.new is of a run that was killed: $RUN"),
     ("rm -r $B", "kestrel; rm tz_latest", "$B is missing: $RUN, and remove $S/tz_latest",
      "$LEAVES"),
-    ("ln -sfn $B zoneinfo", "kestrel", "$S/zoneinfo leads to $B, which is no copy: $RUN",
-     "$RETURNS"),
     ("ln -sfn tz/2026b.1.0/zoneinfo zoneinfo", "kestrel",
      "$S/zoneinfo leads to tz/2026b.1.0/zoneinfo, which is no copy: $RUN", "$RETURNS"),
     ("ln -sfn $B/icutz zoneinfo", "kestrelctl back 2026b.1.0",
@@ -336,10 +330,6 @@ def test_damaged_downloads(row):
     ("ln -sfn tz/2026b.1.0 tz_latest", "rm tz_latest",
      "$S/tz_latest leads to tz/2026b.1.0, which is no path of a download: remove $S/tz_latest",
      "$LEAVES"),
-    ("ln -sfn $S/tz/x tz_latest", "rm tz_latest",
-     "$S/tz_latest names x, which is no version: remove $S/tz_latest"),
-    ("ln -sfn $S/tz/2026c tz_latest", "rm tz_latest",
-     "$S/tz/2026c, the newest download, is missing: remove $S/tz_latest"),
     ("mkdir -p tz/2026c/icutz; : >tz/2026c/icutz/icutz44b.dat; ln -sfn $S/tz/2026c tz_latest",
      "rm tz_latest",
      "$S/tz/2026c has schema 44b, and the system copy has 44l: remove $S/tz_latest"),
@@ -403,8 +393,6 @@ def test_damaged_downloads(row):
     ("echo 44 >/usr/share/icu/icutzformat.txt", "echo 44l >/usr/share/icu/icutzformat.txt",
      "/usr/share/icu/icutzformat.txt does not name a schema such as 44l: repair the image",
      "$LEAVES"),
-    ("kestrelctl back; truncate -s 9 $A/Etc/UTC", "cp $B/zoneinfo/Etc/UTC $A/Etc",
-     "$A/Etc/UTC is not whole: repair the image"),
     # The storage.
     ("mv $S $S.old", "mv $S.old $S", "$S/ is missing or no directory: make it one",
      "$S/tz/ is missing or no directory: make it one", "$S/zoneinfo is missing: $RUN",
@@ -434,7 +422,7 @@ def test_status(row):
 def test_what_is_well():
     publish("2026b")
     sh("cd $B; rm zoneinfo/localtime $A/Etc/UTC; echo x >zoneinfo/tzdata.zi;"
-       "ln -s Asia zoneinfo/Area;"
+       "ln -s Etc/./../Asia zoneinfo/Area;"
        "ln -s metaZones.res icutz/other; mkdir icutz/more; : >icutz/more/x; chmod 600 icutz/more/x;"
        "cp zoneinfo/Etc/UTC /usr/share/x; ln -s /usr/share/x zoneinfo/Own; cp -P zoneinfo/Own $A;"
        "mkdir -p /var/db/icu/kept -m 700 ../other; : >../2026a; : >../../withdrawn;"
@@ -828,8 +816,8 @@ def test_copies_that_others_can_change():
 def test_no_link_is_lost():
     publish("2026b", "2026c")
     for line in ("zone Etc/UTC", "back 2026b.1.0", "back"):
-        for error in ("rename:error=EIO", "symlink:error=EROFS", "symlink:error=EIO:when=2+"):
-            done = ctl(line, *TRACER, "-e", f"inject={error}")[1] == 0
+        for failing in ("rename", "symlink", "symlink:when=2+", "symlink:when=3+"):
+            done = ctl(line, *TRACER, "-e", f"inject={failing}:error=EIO")[1] == 0
             assert (STORAGE / "localtime").exists() and (STORAGE / "zoneinfo").exists(), line
             assert done or (STORAGE / "icutz").exists() and (STORAGE / "tz_latest").exists(), line
 
