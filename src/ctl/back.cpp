@@ -5,6 +5,7 @@
 #include "ctl/diagnosis.h"
 #include "ctl/files.h"
 #include "ctl/print.h"
+#include "ctl/reports.h"
 #include "ctl/withdrawn.h"
 #include "ctl/workplace.h"
 #include "dataset/vela_dataset.h"
@@ -73,6 +74,7 @@ outcome go_back(const std::string& version) {
   withdraw(now, withdrawn_after(now, version));
   name_newest(path);  // before the rest, so that no run in between undoes that
   if (!is_done) vela_dataset(path).activate();
+  const faults failed_calls = reports();
   sync_file_system(paths::storage);
 
   const device then = read_device();
@@ -82,6 +84,7 @@ outcome go_back(const std::string& version) {
     return outcome::done;
   }
   complain(fault("%s is not active", {name}, "see the next lines"));
+  complain_all(failed_calls);
   complain_all(faults_of(then));
   return outcome::failed;
 }

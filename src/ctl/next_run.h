@@ -31,8 +31,6 @@ struct next_run {
   enum class action { keeps, goes_back, switches, fails };
   action what;
   std::string path = {};  // of the download that the run switches to
-
-  bool operator==(const next_run& other) const = default;
 };
 
 /// Reads the device as a run does. Prints nothing.

@@ -52,7 +52,7 @@ faults faults_of_storage() {
 }
 
 storage_lock::storage_lock()
-    : directory(::open(paths::downloads, O_RDONLY | O_DIRECTORY | O_CLOEXEC)),
+    : directory(::open(paths::downloads, O_RDONLY | O_CLOEXEC)),
       held(directory.is_open() && ::flock(directory.get(), LOCK_EX | LOCK_NB) == 0) {
   check(held || (directory.is_open() && errno == EWOULDBLOCK), paths::downloads);
 }
@@ -93,6 +93,6 @@ void replace_link(const std::string& target, const char* link, const char* stage
 }
 
 void sync_file_system(const char* directory) {
-  const fs::descriptor opened(::open(directory, O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  const fs::descriptor opened(::open(directory, O_RDONLY | O_CLOEXEC));
   check(opened.is_open() && ::syncfs(opened.get()) == 0, directory);
 }
