@@ -173,7 +173,6 @@ def wanted(lines):
      "$F/zoneinfo/tzdata.zi is of release 2026d, not 2026c"),
     ("echo x | tee zoneinfo/A >zoneinfo/Z", "$F/zoneinfo/A is not whole",
      "$F/zoneinfo/Z is not whole"),
-    ("head -c 60 zoneinfo/Etc/UTC >zoneinfo/New", "$F/zoneinfo/New is not whole"),
     ("rm zoneinfo/Etc/UTC", "$F/zoneinfo/Etc/UTC is missing"),
     ("rm zoneinfo/Etc/UTC; mkdir zoneinfo/Etc/UTC", "$F/zoneinfo/Etc/UTC is missing"),
     ("mv zoneinfo/Etc .; ln -s ../Etc zoneinfo", "$F/zoneinfo/Etc $LEADS_OUT"),
@@ -237,13 +236,10 @@ def test_damaged_downloads(row):
     (": >$B/zoneinfo/zone.tab", ADD, "$B/zoneinfo/zone.tab is not whole: $AGAIN"),
     ("printf 'a\\0' >$B/zoneinfo/zone.tab", ADD, "$B/zoneinfo/zone.tab is not whole: $AGAIN"),
     ("printf TZif >$B/zoneinfo/posixrules", ADD, "$B/zoneinfo/posixrules is not whole: $AGAIN"),
-    ("ln -s ../../x $B/icutz/x", "rm $B/icutz/x", "$B/icutz/x $LEADS_OUT: $AGAIN"),
     ("ln -sfn /root $B/zoneinfo/Etc/X", ADD, "$B/zoneinfo/Etc/X $LEADS_OUT: $AGAIN"),
     ("rm $B/zoneinfo/Etc/UTC; ln -s $A/Etc/UTC $B/zoneinfo/Etc/UTC", ADD,
      "$B/zoneinfo/Etc/UTC $LEADS_OUT: $AGAIN"),
     ("rm $B/icutz/icutz44l.dat", ADD, "$B/icutz/icutz44l.dat is missing or no file: $AGAIN",
-     "$LEAVES"),
-    ("rm -r $B/icutz; : >$B/icutz", ADD, "$B/icutz/icutz44l.dat is missing or no file: $AGAIN",
      "$LEAVES"),
     ("mv $B/icutz/icutz44{l,b}.dat", "kestrel; rm tz_latest",
      "$B has schema 44b, and the system copy has 44l: $RUN, and remove $S/tz_latest", "$LEAVES"),
@@ -263,8 +259,6 @@ def test_damaged_downloads(row):
     ("touch $B/icutz/x; chmod 606 $B/icutz/x", "rm $B/icutz/x",
      "not everyone can read $B/icutz/x: chmod a+rX it"),
     ("chmod 644 $B/zoneinfo/Etc", "chmod a+rX $B/zoneinfo/Etc",
-     "not everyone can read $B/zoneinfo/Etc: chmod a+rX it"),
-    ("chmod 700 $B/zoneinfo/Etc", "chmod 755 $B/zoneinfo/Etc",
      "not everyone can read $B/zoneinfo/Etc: chmod a+rX it"),
     ("chmod 600 $B/icutz/icutz44l.dat", "chmod 644 $B/icutz/icutz44l.dat; kestrel",
      "not everyone can read $B/icutz/icutz44l.dat: chmod a+rX it", "$LEAVES"),
@@ -350,8 +344,6 @@ def test_damaged_downloads(row):
     ("rm localtime", "kestrelctl zone Asia/Tokyo", "$S/localtime is missing: kestrelctl zone NAME"),
     ("rm localtime; mkdir localtime", "rmdir localtime; kestrelctl zone Asia/Tokyo",
      "$S/localtime is no link: remove it, and kestrelctl zone NAME"),
-    ("ln -sfn zoneinfo/Asia/Tokyo localtime", "kestrelctl zone Asia/Tokyo",
-     "$S/localtime leads to zoneinfo/Asia/Tokyo, not into $S/zoneinfo: kestrelctl zone NAME"),
     ("ln -sfn $S/zoneinfo/Asia localtime", "kestrelctl zone Asia/Tokyo",
      "the local zone Asia is not whole in the active copy: kestrelctl zone NAME"),
     ("ln -sfn $S/zoneinfo/+VERSION localtime", "kestrelctl zone Asia/Tokyo",
@@ -505,14 +497,10 @@ def test_status_of_another_user(closed):
      "$S/icutz is no link: remove it, and kestrelctl back 2026c.1.0"),
     ("rm zoneinfo; mkdir zoneinfo", "back", 1, "$S/zoneinfo is no link: remove it, and $RUN"),
     ("rm tz_latest; mkdir tz_latest", "back", 1, "$S/tz_latest is no link: remove it"),
-    ("rm tz_latest; mkdir tz_latest", "publish 2026d.1.0 DIR", 1,
-     "$S/tz_latest is no link: remove it"),
     ("mkdir withdrawn", "publish 2026d.1.0 DIR", 1, "$S/withdrawn cannot be read: remove it"),
     ("rm $A/+VERSION", "publish 2026d.1.0 DIR", 1,
      "$A/+VERSION is missing, empty or unreadable: repair the image"),
     ("chmod 700 tz", "publish 2026d.1.0 DIR", 1, "not everyone can read $S/tz: chmod a+rX it"),
-    ("rm icutz; mkdir icutz", "prune", 1,
-     "$S/icutz is no link: remove it, and kestrelctl back 2026c.1.0"),
     ("mkdir withdrawn", "prune", 1, "$S/withdrawn cannot be read: remove it"),
     ("ln -sfn $S/tz zoneinfo", "zone Etc/UTC", 1,
      "$S/zoneinfo leads to $S/tz, which is no copy: $RUN",
@@ -804,8 +792,8 @@ def test_copies_that_others_can_change():
     os.chmod(STORAGE / "tz/2026b.1.0/zoneinfo/Etc/UTC", 0o666)
     fetch("2026b")
     for change in ("echo more >zoneinfo/more", "rm -r zoneinfo/more icutz/*.dat",
-                   "touch icutz/icutz44l.dat; ln -sfn Etc/UTC zoneinfo/Japan"):
-        subprocess.run(change, shell=True, cwd=FETCHED, check=True)
+                   "touch icutz/*44l.dat; rm zoneinfo/Japan; cp zoneinfo/{Asia/Tokyo,Japan}"):
+        subprocess.run(["bash", "-c", change], cwd=FETCHED, check=True)
         said = ctl("publish 2026b.1.0 DIR")
         assert said[1] == 4 and "has other content" in said[0]
     publish("2026b")
@@ -898,6 +886,10 @@ def test_no_zone(name):
     ("zone Asia/Tokyo", "syncfs:error=ENOSPC", 5, "$S/: No space left on device", "$NO_ROOM"),
     ("zone Asia/Tokyo", "syncfs:error=EDQUOT", 5, "$S/: Disk quota exceeded", "$NO_ROOM"),
     ("back", "unlink:error=EIO", 1, "remove: could not remove $S/tz_latest: Input/output error"),
+    ("back", "unlink:error=EIO:when=4", 1, "2026a.1.0 is not active: see the next lines",
+     "remove: could not remove $S/icutz: Input/output error",
+     "unlink of ICU softlink failed: Input/output error",
+     "$S/icutz is not that of the active copy: kestrelctl back"),
     ("prune", "flock:error=ENOLCK", 1, "$S/tz/: No locks available"),
     ("prune", "unlinkat:error=EPERM", 1, "$S/tz/2025z cannot be removed: Operation not permitted"),
     ("publish 2026b.1.0 DIR", "renameat2:error=EIO", 1, "$B: Input/output error"),

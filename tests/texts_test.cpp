@@ -10,8 +10,10 @@
 #include "ctl/bundle.h"
 #include "ctl/files.h"
 #include "ctl/tzif.h"
+#include "dataset/vela_dataset.h"
 #include "dataset/vela_icu.h"
 #include "dataset/vela_version.h"
+#include "dataset/vela_zoneinfo.h"
 #include "fs/file.h"
 #include "fs/operations.h"
 #include "startup/dataset_links.h"
@@ -44,7 +46,8 @@ TEST(Texts, ScannersFollowTheirPatterns) {
     std::string text;
     for (auto count = random() % 5; count > 0; --count)
       text += pieces[random() % std::size(pieces)];
-    if (random() % 4 == 0) text += static_cast<char>(random() % 128);
+    if (random() % 4 == 0)
+      text.insert(random() % (text.size() + 1), 1, static_cast<char>(random() % 128));
     EXPECT_EQ(parsed(text) != vela_version(), std::regex_match(text, version)) << text;
     const std::string name = "icutz" + text + ".dat";
     EXPECT_EQ(data_file_schema(name), std::regex_match(name, match, data_file) ? match.str(1) : "");
@@ -88,6 +91,7 @@ TEST_F(Files, AndLinksAreReadUpToALimit) {
   EXPECT_EQ(first_word_of(std::string(" \t\n\v\f\ra\0b\rc", 11)), std::string("a\0b", 3));
   EXPECT_EQ(first_word_of(std::string(10000, '\n') + word + std::string(9000, ' ') + "x"), word);
   EXPECT_EQ(first_word_of(std::string(4096, '7') + " x"), std::string(4096, '7'));
+  EXPECT_EQ(first_word_of(std::string((64 << 20) - 6, ' ') + "2022a "), "2022a");
   EXPECT_EQ(first_word_of(std::string(64 << 20, ' ') + "2022a "), "");
   ASSERT_EQ(::symlink(std::string(1500, 'x').c_str(), (folder + "/link").c_str()), 0);
   EXPECT_EQ(fs::read_symlink((folder + "/link").c_str()), std::string(1024, 'x'));
@@ -103,6 +107,8 @@ TEST_F(Files, TheFirstFitFileOfADirectoryCounts) {
     if (first.empty()) first = data_file_schema(item.path().filename().c_str());
   std::ofstream(folder + "/one/icutz/icutz" + first + ".dat") << first;
   EXPECT_TRUE(vela_icu(folder + "/all").compatible_schema(vela_icu(folder + "/one"))) << first;
+  EXPECT_FALSE(vela_icu(folder + "/one").compatible_schema(vela_zoneinfo(folder + "/one")));
+  EXPECT_EQ(vela_dataset("/var/db/timezone/tz/a"), vela_dataset("/var/db/timezone/tz/a"));
 }
 
 /// No part of a zone is whole, nor one with more behind it or without the start of its footer.
