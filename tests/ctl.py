@@ -237,8 +237,6 @@ def test_damaged_downloads(row):
     ("printf 'a\\0' >$B/zoneinfo/zone.tab", ADD, "$B/zoneinfo/zone.tab is not whole: $AGAIN"),
     ("printf TZif >$B/zoneinfo/posixrules", ADD, "$B/zoneinfo/posixrules is not whole: $AGAIN"),
     ("ln -sfn /root $B/zoneinfo/Etc/X", ADD, "$B/zoneinfo/Etc/X $LEADS_OUT: $AGAIN"),
-    ("rm $B/zoneinfo/Etc/UTC; ln -s $A/Etc/UTC $B/zoneinfo/Etc/UTC", ADD,
-     "$B/zoneinfo/Etc/UTC $LEADS_OUT: $AGAIN"),
     ("rm $B/icutz/icutz44l.dat", ADD, "$B/icutz/icutz44l.dat is missing or no file: $AGAIN",
      "$LEAVES"),
     ("mv $B/icutz/icutz44{l,b}.dat", "kestrel; rm tz_latest",
@@ -254,8 +252,6 @@ def test_damaged_downloads(row):
     ("chmod 600 $B/icutz/metaZones.res", "chmod a+rX $B/icutz/metaZones.res",
      "not everyone can read $B/icutz/metaZones.res: chmod a+rX it"),
     ("chmod 705 $B", "chmod a+rX $B", "not everyone can read $B: chmod a+rX it"),
-    ("chmod 600 $B/zoneinfo/Asia/Tokyo", "chmod a+rX $B/zoneinfo/Asia/Tokyo",
-     "not everyone can read $B/zoneinfo/Asia/Tokyo: chmod a+rX it"),
     ("touch $B/icutz/x; chmod 606 $B/icutz/x", "rm $B/icutz/x",
      "not everyone can read $B/icutz/x: chmod a+rX it"),
     ("chmod 644 $B/zoneinfo/Etc", "chmod a+rX $B/zoneinfo/Etc",
@@ -344,8 +340,6 @@ def test_damaged_downloads(row):
     ("rm localtime", "kestrelctl zone Asia/Tokyo", "$S/localtime is missing: kestrelctl zone NAME"),
     ("rm localtime; mkdir localtime", "rmdir localtime; kestrelctl zone Asia/Tokyo",
      "$S/localtime is no link: remove it, and kestrelctl zone NAME"),
-    ("ln -sfn $S/zoneinfo/Asia localtime", "kestrelctl zone Asia/Tokyo",
-     "the local zone Asia is not whole in the active copy: kestrelctl zone NAME"),
     ("ln -sfn $S/zoneinfo/+VERSION localtime", "kestrelctl zone Asia/Tokyo",
      "the local zone +VERSION is not whole in the active copy: kestrelctl zone NAME"),
     ("ln -sfn $S/zoneinfo//Asia/Tokyo localtime", "kestrelctl zone Asia/Tokyo",
@@ -853,6 +847,8 @@ def test_the_run():
         "kestrel is neither beside kestrelctl nor in the PATH: install it",
         "2026b.1.0 is not active: see the next lines",
         "the next run of kestrel switches to $B: $RUN"])
+    assert ctl("publish 2026b.1.0 DIR", *TRACER, "-e", "inject=/^clone:error=EAGAIN") == (
+        "kestrelctl: kestrel: Resource temporarily unavailable\n", 1)
     os.makedirs("/run/systemd/system", exist_ok=True)
     os.makedirs("/tmp/bin", exist_ok=True)
     Path("/tmp/bin/systemctl").write_text("#!/bin/sh\necho $@ >/tmp/asked; kestrel\n")

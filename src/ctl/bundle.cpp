@@ -24,10 +24,7 @@ std::uint64_t number_at(std::string_view content, std::size_t place, std::size_t
 }  // namespace
 
 bool is_whole_bundle(std::string_view content) {
-  constexpr std::size_t before_body = 16;
-  if (content.size() < before_body || content.substr(2, 2) != "\xda\x27" ||
-      content.substr(12, 4) != "ResB")
-    return false;
+  if (content.find("\xda\x27", 2) != 2 || content.find("ResB", 12) != 12) return false;
   // The fifth word of the body is the body's length in words of 32 bits.
   const auto body = static_cast<std::size_t>(number_at(content, 0, 2));
   if (content.size() < body + 16 + 4) return false;

@@ -76,9 +76,8 @@ void copy_file(const place& from, const place& to, const std::string& name) {
   const fs::descriptor copy(::openat(
       to.directory, name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, file_mode));
   check(copy.is_open(), to / name);
-  constexpr std::size_t all = 1U << 30;
   for (ssize_t count = 1; count > 0;) {
-    count = ::sendfile(copy.get(), source.get(), nullptr, all);
+    count = ::sendfile(copy.get(), source.get(), nullptr, INT_MAX);
     check(count >= 0, path + " to " + (to / name));
   }
 }

@@ -321,8 +321,6 @@ ways_back find_ways_back(const device& now) {
                 entry.path() == now.active_path ? cure_of_data(now) : "remove it"));
     }
   }
-  std::ranges::sort(found.accepted, [](const std::string& one, const std::string& other) {
-    return version_of(one) < version_of(other);
-  });
+  std::ranges::sort(found.accepted, {}, version_of);
   return found;
 }

@@ -149,6 +149,7 @@ bool run_kestrel() {
       std::filesystem::path(program_invocation_name).replace_filename("kestrel");
   const bool has_manager = is_there("/run/systemd/system");
   const pid_t child = ::fork();
+  check(child != -1, beside);
   if (child == 0 && ::seteuid(::getuid()) == 0 && ::setegid(::getgid()) == 0) {
     if (has_manager) ::execlp("systemctl", "systemctl", "start", "kestrel.service", nullptr);
     ::execlp(beside.c_str(), beside.c_str(), nullptr);
@@ -156,7 +157,7 @@ bool run_kestrel() {
   if (child == 0) ::_exit(not_found);
   int status = 0;
   ::waitpid(child, &status, 0);
-  return child > 0 && WEXITSTATUS(status) != not_found;
+  return WEXITSTATUS(status) != not_found;
 }
 
 /// Has runs switch to the download: two where the first one has to go back to the system copy.
