@@ -42,14 +42,14 @@ std::vector<std::string> names_in(const place& from) {
   const std::unique_ptr<DIR, int (*)(DIR*)> list(::fdopendir(directory), ::closedir);
   check(list != nullptr, from.path);
   std::vector<std::string> names;
-  errno = 0;
-  while (const dirent* const entry = ::readdir(list.get())) {
+  while (true) {
+    errno = 0;
+    const dirent* const entry = ::readdir(list.get());
+    check(entry != nullptr || errno == 0, from.path);
+    if (entry == nullptr) return names;
     const std::string name = entry->d_name;
     if (name != "." && name != "..") names.push_back(name);
-    errno = 0;
   }
-  check(errno == 0, from.path);
-  return names;
 }
 
 /// Why an entry is not safe from others, who can exchange or write it meanwhile.
@@ -164,7 +164,7 @@ std::map<std::string, std::string> contents_of(const std::filesystem::path& top)
 }  // namespace
 
 faults copy_download(const std::string& from, const std::string& to) {
-  const fs::descriptor source(::open(from.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  const fs::descriptor source(::open(from.c_str(), O_RDONLY | O_CLOEXEC));
   check(source.is_open(), from);
   check(::mkdir(to.c_str(), directory_mode) == 0, to);
   const fs::descriptor copy(::open(to.c_str(), directory_flags));

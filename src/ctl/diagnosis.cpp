@@ -45,8 +45,7 @@ std::string way_back_to(const device& now) {
 
 /// What programs and runs read, as far as it is known.
 std::vector<std::string> places_of_copies(const device& now) {
-  std::vector<std::string> places = {system_version_file, paths::system_schema, paths::storage,
-                                     paths::downloads};
+  std::vector<std::string> places = {system_version_file, paths::system_schema, paths::downloads};
   for (const std::string& version : {now.active_version, now.latest_version}) {
     const std::string path = path_of(version);
     if (version_of(version) != vela_version())
