@@ -128,6 +128,7 @@ def test_the_life_of_a_device():
 def test_versions(version, status, line):
     publish("2026c", "2026d")
     ctl("back 2026c.1.0")
+    sh("rm tz_latest")
     fetch("2026f")
     before = found()
     said = ctl(f"publish {version} DIR")
@@ -234,6 +235,7 @@ def test_damaged_downloads(row):
      "$B/zoneinfo/Own is not whole: $AGAIN"),
     ("ln -s /nowhere $B/zoneinfo/Own", ADD, "$B/zoneinfo/Own $LEADS_OUT: $AGAIN"),
     (": >$B/zoneinfo/zone.tab", ADD, "$B/zoneinfo/zone.tab is not whole: $AGAIN"),
+    ("yes | head -c 3M >$B/zoneinfo/zone.tab", ADD, "$B/zoneinfo/zone.tab is not whole: $AGAIN"),
     ("printf 'a\\0' >$B/zoneinfo/zone.tab", ADD, "$B/zoneinfo/zone.tab is not whole: $AGAIN"),
     ("printf TZif >$B/zoneinfo/posixrules", ADD, "$B/zoneinfo/posixrules is not whole: $AGAIN"),
     ("ln -sfn /root $B/zoneinfo/Etc/X", ADD, "$B/zoneinfo/Etc/X $LEADS_OUT: $AGAIN"),
@@ -342,8 +344,6 @@ def test_damaged_downloads(row):
      "$S/localtime is no link: remove it, and kestrelctl zone NAME"),
     ("ln -sfn $S/zoneinfo/+VERSION localtime", "kestrelctl zone Asia/Tokyo",
      "the local zone +VERSION is not whole in the active copy: kestrelctl zone NAME"),
-    ("ln -sfn $S/zoneinfo//Asia/Tokyo localtime", "kestrelctl zone Asia/Tokyo",
-     "the local zone /Asia/Tokyo is not whole in the active copy: kestrelctl zone NAME"),
     ("mkdir -pm 700 /tmp/closed; : >/tmp/closed/z; "
      "ln -sfn $S/zoneinfo/../../../../../../tmp/closed/z localtime",
      "kestrelctl zone Asia/Tokyo", "not everyone can read /tmp/closed: chmod a+rX it"),
@@ -451,9 +451,11 @@ def test_what_status_prints():
 @several_users
 @pytest.mark.parametrize("closed", ["$S/tz", "$B", "$B/zoneinfo", "$B/icutz", "$A", "$A/+VERSION",
                                     "$B/zoneinfo/Asia", "$B/zoneinfo/Asia/Tokyo",
-                                    "/usr/share/icu/icutzformat.txt"])
+                                    "/usr/share/icu/icutzformat.txt", "$S/tz/2026c"])
 def test_status_of_another_user(closed):
     publish("2026b")
+    if "2026c" in closed:
+        sh("cp -r $B tz/2026c; ln -sfn $S/tz/2026c tz_latest")
     path = os.path.expandvars(closed)
     os.chmod(path, 0o700)
     another = ["setpriv", "--reuid=4321", "--clear-groups"]
@@ -482,14 +484,11 @@ def test_status_of_another_user(closed):
     ("echo 2026d >$A/+VERSION", "back 2026b.1.0", 4,
      "$B is older than the system copy, 2026d.1.0"),
     ("rm $B/zoneinfo/Etc/UTC", "back 2026b.1.0", 4, "$B/zoneinfo/Etc/UTC is missing"),
-    ("ln -sfn $S/zoneinfo/New localtime", "back 2026b.1.0", 4,
-     "$B/zoneinfo has not the local zone, New"),
     ("ln -sfn $S/zoneinfo/New localtime", "back", 4, "$A has not the local zone, New"),
     ("echo 2147483648a >$A/+VERSION", "back", 4,
      "$A/+VERSION does not name a release such as 2026b: repair the image"),
     ("rm icutz; mkdir icutz", "back 2026b.1.0", 1,
      "$S/icutz is no link: remove it, and kestrelctl back 2026c.1.0"),
-    ("rm zoneinfo; mkdir zoneinfo", "back", 1, "$S/zoneinfo is no link: remove it, and $RUN"),
     ("rm tz_latest; mkdir tz_latest", "back", 1, "$S/tz_latest is no link: remove it"),
     ("mkdir withdrawn", "publish 2026d.1.0 DIR", 1, "$S/withdrawn cannot be read: remove it"),
     ("rm $A/+VERSION", "publish 2026d.1.0 DIR", 1,
@@ -698,7 +697,10 @@ def test_storage_of_another_user():
     assert said == ("kestrelctl: /tmp/fetched: Permission denied\n", 1)
     said = ctl("prune", "setpriv", "--reuid=4321", "--clear-groups")
     assert said[1] == 1 and "/var/db/timezone/ cannot be changed: Permission denied" in said[0]
-    sh("mkdir -p tz/2025y/x tz/.kestrelctl/x")
+    sh("chmod u-w tz")
+    assert ctl("prune") == ("kestrelctl: /var/db/timezone/tz/ cannot be changed: "
+                            "Permission denied\n", 1)
+    sh("chmod u+w tz; mkdir -p tz/2025y/x tz/.kestrelctl/x")
     said = ctl("prune", *AS_OWNER)
     assert said[1] == 1 and "tz/2025y cannot be removed: Permission denied" in said[0]
     assert "/.kestrelctl" not in said[0]
@@ -877,10 +879,8 @@ def test_no_zone(name):
     ("zone Etc/UTC", "symlink:error=EEXIST:when=1..2", 0),
     ("zone Etc/UTC", "rename:error=EEXIST", 0),
     ("zone Etc/UTC", "rename:error=EIO", 1, "$S/localtime: Input/output error"),
-    ("zone Etc/UTC", "rename:error=EDQUOT", 5, "$STAGED: Disk quota exceeded", "$NO_ROOM"),
     ("zone Asia/Tokyo", "syncfs:error=EIO", 1, "$S/: Input/output error"),
     ("zone Asia/Tokyo", "syncfs:error=ENOSPC", 5, "$S/: No space left on device", "$NO_ROOM"),
-    ("zone Asia/Tokyo", "syncfs:error=EDQUOT", 5, "$S/: Disk quota exceeded", "$NO_ROOM"),
     ("back", "unlink:error=EIO", 1, "remove: could not remove $S/tz_latest: Input/output error"),
     ("back", "unlink:error=EIO:when=4", 1, "2026a.1.0 is not active: see the next lines",
      "remove: could not remove $S/icutz: Input/output error",
@@ -925,4 +925,5 @@ def test_usage():
     assert ctl("--help") == ("usage: kestrelctl status | publish VERSION DIRECTORY | "
                              "back [VERSION] | prune | zone NAME\n", 0)
     assert re.fullmatch(r"kestrelctl \d\S+\n", ctl("--version")[0])
-    assert sh("kestrelctl --version >/dev/full").returncode == 1
+    full = sh("kestrelctl --version >/dev/full")
+    assert (full.returncode, full.stderr) == (1, b"kestrelctl: standard output cannot be written\n")
