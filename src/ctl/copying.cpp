@@ -164,7 +164,7 @@ std::map<std::string, std::string> contents_of(const std::filesystem::path& top)
 }  // namespace
 
 faults copy_download(const std::string& from, const std::string& to) {
-  const fs::descriptor source(::open(from.c_str(), O_RDONLY | O_CLOEXEC));
+  const fs::descriptor source(::open(from.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   check(source.is_open(), from);
   check(::mkdir(to.c_str(), directory_mode) == 0, to);
   const fs::descriptor copy(::open(to.c_str(), directory_flags));

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstdio>
+#include <cstring>
 #include <filesystem>
 #include <optional>
 #include <system_error>
@@ -142,14 +143,14 @@ void name_for_runs(const device& now, const candidate& wanted) {
 }
 
 /// Starts a run of kestrel, by the service manager where there is one, and waits for its end. Else
-/// kestrel is found as this program was: beside it, or in the PATH. False where there is none.
-bool run_kestrel() {
+/// kestrel is found as this program was: beside it, or in the PATH. Empty where it was started.
+faults run_kestrel() {
   constexpr int not_found = 127;
   const std::string beside =
       std::filesystem::path(program_invocation_name).replace_filename("kestrel");
   const bool has_manager = is_there("/run/systemd/system");
   const pid_t child = ::fork();
-  check(child != -1, beside);
+  if (child == -1) return {fault("no process can be started", {}, std::strerror(errno))};
   if (child == 0 && ::seteuid(::getuid()) == 0 && ::setegid(::getgid()) == 0) {
     if (has_manager) ::execlp("systemctl", "systemctl", "start", "kestrel.service", nullptr);
     ::execlp(beside.c_str(), beside.c_str(), nullptr);
@@ -157,15 +158,16 @@ bool run_kestrel() {
   if (child == 0) ::_exit(not_found);
   int status = 0;
   ::waitpid(child, &status, 0);
-  return WEXITSTATUS(status) != not_found;
+  if (WEXITSTATUS(status) != not_found) return {};
+  return {fault("kestrel is neither beside kestrelctl nor in the PATH", {}, "install it")};
 }
 
 /// Has runs switch to the download: two where the first one has to go back to the system copy.
 outcome activate(const candidate& wanted) {
   device now = read_device();
   for (int runs = 0; runs < 2 && !is_active(now, wanted.path); ++runs) {
-    if (!run_kestrel()) {
-      complain(fault("kestrel is neither beside kestrelctl nor in the PATH", {}, "install it"));
+    if (const faults found = run_kestrel(); !found.empty()) {
+      complain_all(found);
       break;
     }
     now = read_device();

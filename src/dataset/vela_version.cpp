@@ -28,7 +28,7 @@ std::string_view take_dotted_number(std::string_view& rest) {
 /// The value of a run of digits, -1 for an empty one.
 std::int32_t to_number(std::string_view number) {
   std::int32_t value = -1;
-  const auto result = std::from_chars(number.begin(), number.end(), value);
+  const auto result = std::from_chars(number.data(), number.data() + number.size(), value);
   if (result.ec == std::errc::result_out_of_range) {
     errno = ERANGE;
     throw std::out_of_range("version number");

@@ -60,8 +60,8 @@ void create_symlink(const char* target, const char* link) {
 
 bool is_symlink_to(const char* target, const char* link) noexcept {
   const int error = errno;
-  std::array<char, PATH_MAX> content{};  // NULs behind what is read: every link is shorter
-  [[maybe_unused]] const ssize_t ignored = ::readlink(link, content.data(), content.size());
+  std::array<char, PATH_MAX> content{};  // ends with a NUL, whatever is read
+  [[maybe_unused]] const ssize_t ignored = ::readlink(link, content.data(), content.size() - 1);
   errno = error;
   return std::string_view(content.data()) == target;
 }
