@@ -108,6 +108,14 @@ def test_scene(name):
     assert found() == expected
 
 
+# No scene, as qemu keeps such a call to itself.
+def test_marks():
+    make(SCENES["steady"]["+"])
+    os.system("ASAN_OPTIONS=detect_leaks=0 strace -yo /tmp/trace kestrel 2>/dev/null")
+    marked = re.findall(r"fcntl.*<(.*)>, 0x40 .*, 0x4\)", Path("/tmp/trace").read_text())
+    assert marked == [STORAGE, STORAGE + "/tz"]
+
+
 # Random worlds are made of these: a path and what may be there, first what is common. "-" is
 # nothing, and "?" one of the versions.
 VERSIONS = "2022b.1.0 2022b.1.0 2022c.1.0 2022c.1.0 2022z 2147483648a x /2022c.1.0".split()
