@@ -210,22 +210,16 @@ def test_damaged_downloads(row):
     ("rm $B/icutz/metaZones.res", ADD, "$B/icutz/metaZones.res is missing: $AGAIN"),
     ("rm $B/zoneinfo/Etc/UTC; mkfifo $B/zoneinfo/Etc/UTC", ADD,
      "$B/zoneinfo/Etc/UTC is neither a file, nor a directory, nor a link: $AGAIN"),
-    ("rm $B/zoneinfo/Etc/UTC; ln -s /dev/zero $B/zoneinfo/Etc/UTC", ADD,
-     "$B/zoneinfo/Etc/UTC $LEADS_OUT: $AGAIN"),
     ("echo 2026a >$B/zoneinfo/+VERSION", ADD,
      "$B/zoneinfo/+VERSION is of release 2026a, not 2026b: $AGAIN"),
     ("cp /tmp/big $B/icutz/metaZones.res", ADD,
      "$B/icutz/metaZones.res has not the byte order of schema 44l: $AGAIN"),
     ("rm -r $B/zoneinfo/Etc", ADD, "$B/zoneinfo/Etc is missing: $AGAIN"),
-    ("ln -s nowhere $B/zoneinfo/New", ADD, "$B/zoneinfo/New $LEADS_OUT: $AGAIN"),
     ("ln -s UTC/../UTC $B/zoneinfo/Etc/New", ADD, "$B/zoneinfo/Etc/New $LEADS_OUT: $AGAIN"),
     ("ln -s Asia/ $B/zoneinfo/Area; ln -s Area/../../zoneinfo/Japan $B/zoneinfo/New", ADD,
      "$B/zoneinfo/New $LEADS_OUT: $AGAIN"),
-    ("ln -sfn /etc/localtime $B/zoneinfo/Etc/UTC", ADD, "$B/zoneinfo/Etc/UTC $LEADS_OUT: $AGAIN"),
     ("mkdir $B/icutz/E; ln -s ../../x $B/icutz/E", ADD, "$B/icutz/E/x $LEADS_OUT: $AGAIN"),
     ("mkdir $B/icutz/E; ln -s ../icutz/E $B/zoneinfo", ADD, "$B/zoneinfo/E $LEADS_OUT: $AGAIN"),
-    ("rm $B/zoneinfo/+VERSION; mkdir $B/zoneinfo/+VERSION", ADD,
-     "$B/zoneinfo/+VERSION is of release , not 2026b: $AGAIN"),
     ("rm $B/icutz/metaZones.res; mkdir $B/icutz/metaZones.res", ADD,
      "$B/icutz/metaZones.res is not whole: $AGAIN"),
     ("rm -r $B/icutz; ln -s icutz $B/icutz", ADD,
@@ -249,7 +243,6 @@ def test_damaged_downloads(row):
     ("ln -sfn Etc $B/zoneinfo/Japan", ADD, "$B/zoneinfo/Japan is missing: $AGAIN"),
     ("mv $B/icutz /tmp/out; ln -s /tmp/out $B/icutz", ADD, "$B/icutz $LEADS_OUT: $AGAIN"),
     ("truncate -s 10G $B/zoneinfo/Etc/UTC", ADD, "$B/zoneinfo/Etc/UTC is not whole: $AGAIN"),
-    ("echo >$B/zoneinfo/+VERSION", ADD, "$B/zoneinfo/+VERSION is of release , not 2026b: $AGAIN"),
     # Modes.
     ("chmod 600 $B/icutz/metaZones.res", "chmod a+rX $B/icutz/metaZones.res",
      "not everyone can read $B/icutz/metaZones.res: chmod a+rX it"),
@@ -270,7 +263,6 @@ def test_damaged_downloads(row):
     # The links to the active copy.
     ("cp -r $B tz/x; ln -sfn $S/tz/x/zoneinfo zoneinfo", "kestrel",
      "$S/tz/x has a name that is no version: $RUN", "$RETURNS"),
-    ("kestrelctl back; rm zoneinfo", "kestrel", "$S/zoneinfo is missing: $RUN", "$LEAVES"),
     ("kestrelctl back; ln -sfn $B/icutz icutz", "kestrelctl back",
      "$S/icutz is not that of the active copy: kestrelctl back"),
     ("kestrelctl back; mkdir icutz", "rmdir icutz",
@@ -336,9 +328,6 @@ def test_damaged_downloads(row):
     ("ln -sfn /usr/share/zoneinfo/Asia/Tokyo localtime", "kestrel",
      "$S/localtime leads to /usr/share/zoneinfo/Asia/Tokyo, not into $S/zoneinfo: "
      "kestrelctl zone NAME"),
-    ("cp $B/zoneinfo/Etc/UTC $B/zoneinfo/Own; kestrelctl zone Own; truncate -s 60 $B/zoneinfo/Own",
-     "cp $B/zoneinfo/Etc/UTC $B/zoneinfo/Own", "$B/zoneinfo/Own is not whole: $AGAIN",
-     "the local zone Own is not whole in the active copy: kestrelctl zone NAME"),
     ("rm localtime", "kestrelctl zone Asia/Tokyo", "$S/localtime is missing: kestrelctl zone NAME"),
     ("rm localtime; mkdir localtime", "rmdir localtime; kestrelctl zone Asia/Tokyo",
      "$S/localtime is no link: remove it, and kestrelctl zone NAME"),
@@ -357,12 +346,8 @@ def test_damaged_downloads(row):
     ("kestrelctl back; truncate -s 9 $A/Asia/Tokyo", "cp $B/zoneinfo/Asia/Tokyo $A/Asia",
      "$A/Asia/Tokyo is not whole: repair the image",
      "the local zone Asia/Tokyo is not whole in the active copy: kestrelctl zone NAME"),
-    ("echo 44b >/usr/share/icu/icutzformat.txt", "echo 44l >/usr/share/icu/icutzformat.txt",
-     "$B has schema 44l, and the system copy has 44b: $RUN, and remove $S/tz_latest", "$LEAVES"),
     ("ln -sfn /usr/share /usr/share/zoneinfo", "ln -sfn $S/zoneinfo /usr/share/zoneinfo",
      "/usr/share/zoneinfo does not lead to $S/zoneinfo: ln -sfn $S/zoneinfo /usr/share/zoneinfo"),
-    ("chmod 600 /usr/share/icu/icutzformat.txt", "chmod a+rX /usr/share/icu/icutzformat.txt",
-     "not everyone can read /usr/share/icu/icutzformat.txt: chmod a+rX it"),
     ("rm /usr/share/zoneinfo; mkdir /usr/share/zoneinfo",
      "rmdir /usr/share/zoneinfo; ln -sfn $S/zoneinfo /usr/share/zoneinfo",
      "/usr/share/zoneinfo does not lead to $S/zoneinfo: "
@@ -477,8 +462,6 @@ def test_status_of_another_user(closed):
     ("", "back 2026z.1.0", 4, "$S/tz/2026z.1.0 is missing"),
     ("mv $B/icutz/icutz44{l,b}.dat", "back 2026b.1.0", 4,
      "$B has schema 44b, and the system copy has 44l"),
-    ("rm $B/icutz/icutz44l.dat", "back 2026b.1.0", 4,
-     "$B/icutz/icutz44l.dat is missing or no file: $AGAIN"),
     ("rm /usr/share/icu/*", "back 2026b.1.0", 4,
      "/usr/share/icu/icutzformat.txt is missing, empty or unreadable: repair the image"),
     ("echo 2026d >$A/+VERSION", "back 2026b.1.0", 4,
@@ -769,6 +752,7 @@ def test_failed_reads(line):
         is_told = re.search("Input/output error|cannot be read|kestrel: ", said[0])
         assert (said, lasting()) == (undisturbed, left) or is_told and (
             said[1] == 1 or re.search("withdrawn|kestrel: ", said[0])), (call, said)
+        assert not re.search("tz/2026c.1.0 cannot be read.*: remove it", said[0]), (call, said)
         assert {"2026b.1.0", "2026c.1.0"} <= set(os.listdir(STORAGE / "tz")), call
 
 
