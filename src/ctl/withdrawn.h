@@ -14,5 +14,6 @@ using version_set = std::set<std::string>;
 [[nodiscard]] std::optional<version_set> read_withdrawn();
 
 /// Replaces the list in one step, on the disk as well when this returns; where the set is empty, it
-/// removes the list, which has to be there. Throws std::system_error; mostly, the old list stays then.
+/// removes the list, which has to be there. Throws std::system_error; mostly, the old list stays
+/// then.
 void write_withdrawn(const version_set& versions);
