@@ -212,7 +212,8 @@ faults faults_of_remains(const device& now) {
   const bool is_in_use =
       std::filesystem::is_directory(std::filesystem::symlink_status(paths::legacy_icu, error)) &&
       !std::filesystem::is_empty(paths::legacy_icu, error);
-  check(!is_hard(error.value()), paths::legacy_icu);
+  errno = error.value();
+  check(!is_hard(errno), paths::legacy_icu);
   if (is_there(paths::legacy_icu) && !is_in_use)
     found.push_back(fault("%s is of an older system", {paths::legacy_icu}, "remove it"));
   return found;

@@ -49,7 +49,7 @@ std::optional<std::string> chosen_path(const run_view& view) {
   const std::string system;
   if (!view.latest_path || !view.current) return system;
   const bool stays = view.current_path && may_stay(*view.current, *view.system);
-  // Such a run ends on the system copy, whatever the latest dataset is.
+  // A run that cannot finish ends on the system copy, whatever the latest dataset is.
   const bool can_finish = view.can_change_storage && !view.is_icutz_directory;
   if (view.has_to_finish && !can_finish) return system;
   if (!view.latest_path->empty()) {
