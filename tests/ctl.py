@@ -214,7 +214,6 @@ def test_damaged_downloads(row):
      "$B/zoneinfo/+VERSION is of release 2026a, not 2026b: $AGAIN"),
     ("cp /tmp/big $B/icutz/metaZones.res", ADD,
      "$B/icutz/metaZones.res has not the byte order of schema 44l: $AGAIN"),
-    ("rm -r $B/zoneinfo/Etc", ADD, "$B/zoneinfo/Etc is missing: $AGAIN"),
     ("ln -s UTC/../UTC $B/zoneinfo/Etc/New", ADD, "$B/zoneinfo/Etc/New $LEADS_OUT: $AGAIN"),
     ("ln -s Asia/ $B/zoneinfo/Area; ln -s Area/../../zoneinfo/Japan $B/zoneinfo/New", ADD,
      "$B/zoneinfo/New $LEADS_OUT: $AGAIN"),
@@ -331,8 +330,6 @@ def test_damaged_downloads(row):
     ("rm localtime", "kestrelctl zone Asia/Tokyo", "$S/localtime is missing: kestrelctl zone NAME"),
     ("rm localtime; mkdir localtime", "rmdir localtime; kestrelctl zone Asia/Tokyo",
      "$S/localtime is no link: remove it, and kestrelctl zone NAME"),
-    ("ln -sfn $S/zoneinfo/+VERSION localtime", "kestrelctl zone Asia/Tokyo",
-     "the local zone +VERSION is not whole in the active copy: kestrelctl zone NAME"),
     ("mkdir -pm 700 /tmp/closed; : >/tmp/closed/z; "
      "ln -sfn $S/zoneinfo/../../../../../../tmp/closed/z localtime",
      "kestrelctl zone Asia/Tokyo", "not everyone can read /tmp/closed: chmod a+rX it"),
@@ -545,6 +542,9 @@ def test_publishing_in_place():
     assert there == ("2026b.1.0 is active\n", 0) and well() is True
     fetch("2026c", STORAGE / "tz/2026d.1.0")
     assert ctl("publish 2026d.1.0 /var/db/timezone/tz/2026d.1.0")[1] == 4
+    sh("mv tz/2026d.1.0 /tmp/moved; ln -s /tmp/moved tz/2026c.1.0")
+    publish("2026c")
+    assert not (STORAGE / "tz/2026c.1.0").is_symlink()
 
 
 # Before each call that changes something, a command is killed, or the call fails, once or from then
@@ -741,7 +741,7 @@ def test_failed_reads(line):
     for call in re.findall(r"(?m)^\d+ +(\w+\(.*)", TRACE.read_text()):
         name, kind = call.split("(")[0], re.sub(r"\d+\w?|\{.*|=.*|Asia|Tokyo|Etc|UTC", "", call)
         seen[name] += 1
-        if "/var/db" not in call or kind in kinds_seen:
+        if not re.search("/var/db|/tmp/fetched", call) or kind in kinds_seen:
             continue
         kinds_seen.add(kind)
         if len(kinds_seen) % 3:
