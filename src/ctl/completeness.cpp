@@ -231,7 +231,7 @@ faults faults_of_copy(const std::string& path, const std::string& version,
   if (path.empty()) copy = {paths::system_zoneinfo, "", paths::system_zoneinfo, copy.schema};
   if (inspect_top(copy, copy.tree)) {
     inspect_tree(copy);
-    if (!path.empty()) inspect_missing(copy);
+    inspect_missing(copy);
     inspect_release(copy, version);
   }
   if (!path.empty()) inspect_bundles(copy);
