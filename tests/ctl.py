@@ -214,6 +214,8 @@ def test_damaged_downloads(row):
      "$B/zoneinfo/+VERSION is of release 2026a, not 2026b: $AGAIN"),
     ("cp /tmp/big $B/icutz/metaZones.res", ADD,
      "$B/icutz/metaZones.res has not the byte order of schema 44l: $AGAIN"),
+    ("ln -sfn /etc/localtime $B/zoneinfo/Etc/UTC", ADD, "$B/zoneinfo/Etc/UTC $LEADS_OUT: $AGAIN"),
+    ("ln -sfn /x $B/zoneinfo/localtime", ADD, "$B/zoneinfo/localtime $LEADS_OUT: $AGAIN"),
     ("ln -s UTC/../UTC $B/zoneinfo/Etc/New", ADD, "$B/zoneinfo/Etc/New $LEADS_OUT: $AGAIN"),
     ("ln -s Asia/ $B/zoneinfo/Area; ln -s Area/../../zoneinfo/Japan $B/zoneinfo/New", ADD,
      "$B/zoneinfo/New $LEADS_OUT: $AGAIN"),
@@ -270,8 +272,6 @@ def test_damaged_downloads(row):
      "$LEAVES"),
     ("for i in {1..37}; do ln -s L$((i+1)) $B/zoneinfo/L$i; done; ln -s Japan $B/zoneinfo/L38", ADD,
      "$B/zoneinfo/L1 $LEADS_OUT: $AGAIN", "$B/zoneinfo/L2 $LEADS_OUT: $AGAIN"),
-    ("kestrelctl back; ln -s /usr/share/icu icutz.new", "kestrel",
-     "$S/icutz.new is of a run that was killed: $RUN"),
     ("rm -r $B", "kestrel; rm tz_latest", "$B is missing: $RUN, and remove $S/tz_latest",
      "$LEAVES"),
     ("ln -sfn $B/icutz zoneinfo", "kestrelctl back 2026b.1.0",
@@ -282,8 +282,6 @@ def test_damaged_downloads(row):
      "the next run of kestrel fails: see the other lines"),
     ("rm icutz", "kestrelctl back 2026b.1.0",
      "$S/icutz is not that of the active copy: kestrelctl back 2026b.1.0"),
-    ("rm icutz; mkdir icutz", "rmdir icutz; kestrelctl back 2026b.1.0",
-     "$S/icutz is no link: remove it, and kestrelctl back 2026b.1.0"),
     ("ln -s $B/icutz icutz.new; rm icutz; mkdir icutz", "rmdir icutz; kestrel",
      "$S/icutz is no link: remove it, and kestrelctl back 2026b.1.0",
      "$S/icutz.new is of a run that was killed: $RUN", "$LEAVES"),
@@ -303,9 +301,6 @@ def test_damaged_downloads(row):
      "$S/tz/2026$LONG, the newest download, is missing: remove $S/tz_latest"),
     ("rm tz_latest; mkdir tz_latest", "rmdir tz_latest", "$S/tz_latest is no link: remove it",
      "$LEAVES"),
-    ("cp -r $B tz/2026c; chmod 700 tz/2026c; ln -sfn $S/tz/2026c tz_latest", "rm tz_latest",
-     "not everyone can read $S/tz/2026c: chmod a+rX it",
-     "the next run of kestrel switches to $S/tz/2026c: see the other lines"),
     ("ln -sfn tz/2026b.1.0 tz_latest", "rm tz_latest",
      "$S/tz_latest leads to tz/2026b.1.0, which is no path of a download: remove $S/tz_latest",
      "$LEAVES"),
@@ -645,7 +640,8 @@ def test_one_at_a_time():
         assert ctl(line) == ("kestrelctl: another kestrelctl is at work: "
                              "start again when it has ended\n", 5)
     os.close(lock)
-    publish("2026b")
+    sh("rm localtime")
+    assert ctl("publish 2026b.1.0 DIR")[1] == 0
 
 
 @several_users
@@ -771,15 +767,17 @@ def test_closed_copies(closed):
 # What others can change is copied anew, and only with the same content.
 def test_copies_that_others_can_change():
     publish("2026b")
-    os.chmod(STORAGE / "tz/2026b.1.0/zoneinfo/Etc/UTC", 0o666)
+    sh("chmod g+w $B/zoneinfo/Etc/UTC")
     fetch("2026b")
     for change in ("echo more >zoneinfo/more", "rm -r zoneinfo/more icutz/*.dat",
                    "touch icutz/icutz44l.dat; cp --remove-destination zoneinfo/{Asia/Tokyo,Japan}"):
         subprocess.run(["bash", "-c", change], cwd=FETCHED, check=True)
         said = ctl("publish 2026b.1.0 DIR")
         assert said[1] == 4 and "has other content" in said[0]
-    publish("2026b")
-    assert os.stat(STORAGE / "tz/2026b.1.0/zoneinfo/Etc/UTC").st_mode & 0o777 == 0o644
+    for place in ("zoneinfo/Etc/UTC", "zoneinfo/Etc", "icutz"):
+        sh(f"chmod g+w $B/{place}")
+        publish("2026b")
+        assert os.stat(STORAGE / "tz/2026b.1.0" / place).st_mode & 0o020 == 0
 
 
 # A link stays where its replacement fails, whatever the reason.
@@ -805,7 +803,9 @@ def test_publishing_beside_a_copy_of_another_schema():
 
 
 def test_many_faults():
-    sh("for i in {1..30}; do : >/tmp/fetched/zoneinfo/empty$i; done")
+    sh("touch $F/zoneinfo/empty{1..20}")
+    assert ctl("publish 2026b.1.0 DIR")[0].count("is not whole\n") == 20
+    sh("touch $F/zoneinfo/more{1..10}")
     said = ctl("publish 2026b.1.0 DIR")
     assert said[0].count("\n") == 21 and said[0].endswith("kestrelctl: 10 more lines like these\n")
 

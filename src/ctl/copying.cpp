@@ -147,7 +147,7 @@ bool is_safe_below(const place& from) {
 /// All that is in a tree: for each path, "/" for a directory, else a link's or a file's content.
 std::map<std::string, std::string> contents_of(const std::filesystem::path& top) {
   std::map<std::string, std::string> all;
-  if (!std::filesystem::is_directory(top)) return all;
+  if (!std::filesystem::is_directory(top)) return {};
   for (const auto& entry : std::filesystem::recursive_directory_iterator(top)) {
     std::string& content = all[entry.path().lexically_relative(top)];
     if (entry.is_symlink()) {

@@ -6,6 +6,7 @@
 #include <functional>
 #include <iostream>
 #include <string>
+#include <string_view>
 #include <system_error>
 #include <vector>
 
@@ -19,27 +20,26 @@ namespace {
 
 using words = std::vector<std::string>;
 
-/// A command. Its arguments are as many as the two numbers say; a version comes first.
+/// A command. Its arguments are as many as the two numbers say. If the usage has a VERSION, that is
+/// the first one.
 struct command {
   const char* name;
   const char* usage;
   std::size_t least;
   std::size_t most;
-  bool takes_version;
   bool changes_storage;
   std::function<outcome(const words&)> run;
 };
 
 const std::vector<command>& commands() {
   static const std::vector<command> all = {
-      {"status", "", 0, 0, false, false, [](const words&) { return print_status(); }},
-      {"publish", " VERSION DIRECTORY", 2, 2, true, true,
+      {"status", "", 0, 0, false, [](const words&) { return print_status(); }},
+      {"publish", " VERSION DIRECTORY", 2, 2, true,
        [](const words& arguments) { return publish(arguments[0], arguments[1]); }},
-      {"back", " [VERSION]", 0, 1, true, true,
+      {"back", " [VERSION]", 0, 1, true,
        [](const words& arguments) { return go_back(arguments.empty() ? "" : arguments[0]); }},
-      {"prune", "", 0, 0, false, true, [](const words&) { return prune(); }},
-      {"zone", " NAME", 1, 1, false, true,
-       [](const words& arguments) { return set_zone(arguments[0]); }},
+      {"prune", "", 0, 0, true, [](const words&) { return prune(); }},
+      {"zone", " NAME", 1, 1, true, [](const words& arguments) { return set_zone(arguments[0]); }},
   };
   return all;
 }
@@ -68,7 +68,8 @@ outcome change(const command& chosen, const words& arguments) {
 outcome run_command(const command& chosen, const words& arguments) {
   if (arguments.size() < chosen.least || arguments.size() > chosen.most)
     return refuse({outcome::wrong_usage, {fault(usage())}});
-  if (chosen.takes_version && !arguments.empty() && version_of(arguments[0]) == vela_version()) {
+  const bool takes_version = std::string_view(chosen.usage).find("VERSION") != std::string::npos;
+  if (takes_version && !arguments.empty() && version_of(arguments[0]) == vela_version()) {
     return refuse({outcome::wrong_usage,
                    {fault("%s is no version", {arguments[0]}, "a version is such as 2026b.1.0")}});
   }
