@@ -15,7 +15,7 @@ faults& kept() {
 
 }  // namespace
 
-const faults& reports() {
+faults reports() {
   return kept();
 }
 

@@ -7,7 +7,7 @@
 // about a change of a link are printed.
 
 /// The lines that are kept, without "kestrel: ".
-[[nodiscard]] const faults& reports();
+[[nodiscard]] faults reports();
 
 /// Keeps none of the lines so far. `stage_link` calls it, before a link is changed.
 void forget_reports();
