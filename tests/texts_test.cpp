@@ -149,7 +149,7 @@ TEST(Whole, TablesOfAZone) {
   EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 6, 2))) << "an abbreviation behind the table";
   EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 5, 1))) << "an indicator for one of two types";
   EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 5, 0).replace(27, 1, "\1") + "x"))
-      << "of the other kind";
+      << "a standard-time indicator for one of two types";
   EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 5, 0).replace(43, 1, "\5"))) << "a name without an end";
   EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 0, 2).replace(61, 6, "names!"))) << "no end at all";
   EXPECT_FALSE(is_whole_zone("TZif" + std::string(40, '\0'))) << "no type";
