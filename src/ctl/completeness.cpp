@@ -2,6 +2,7 @@
 
 #include <sys/stat.h>
 
+#include <cctype>
 #include <cerrno>
 #include <filesystem>
 #include <optional>
@@ -48,8 +49,7 @@ fault not_whole(const std::string& path) {
 
 /// The names of zones begin with capital letters, those of tables do not.
 bool has_zone_name(const std::filesystem::path& entry) {
-  const char first = entry.filename().string().front();
-  return first >= 'A' && first <= 'Z';
+  return std::isupper(static_cast<unsigned char>(entry.filename().string().front())) != 0;
 }
 
 bool is_zone_or_table(const std::string& content, bool is_zone) {
@@ -227,7 +227,6 @@ void inspect_bundles(inspection& copy) {
 faults faults_of_copy(const std::string& path, const std::string& version,
                       const std::string& shown) {
   inspection copy{path, "zoneinfo", shown, schema_of("")};
-  if (!path.empty() && !inspect_top(copy, "")) return copy.found;
   if (path.empty()) copy = {paths::system_zoneinfo, "", paths::system_zoneinfo, copy.schema};
   if (inspect_top(copy, copy.tree)) {
     inspect_tree(copy);

@@ -144,7 +144,7 @@ bool is_safe_below(const place& from) {
   });
 }
 
-/// All that is in a tree: for each path, "/" for a directory, else a link's or a file's content.
+/// All that is in a tree: for each path, nothing for a directory, else what a link or a file holds.
 std::map<std::string, std::string> contents_of(const std::filesystem::path& top) {
   std::map<std::string, std::string> all;
   if (!std::filesystem::is_directory(top)) return {};
@@ -152,9 +152,7 @@ std::map<std::string, std::string> contents_of(const std::filesystem::path& top)
     std::string& content = all[entry.path().lexically_relative(top)];
     if (entry.is_symlink()) {
       content = "> " + link_target(entry.path());
-    } else if (entry.is_directory()) {
-      content = "/";
-    } else {
+    } else if (!entry.is_directory()) {
       content = "= " + read_file(entry.path()).value_or("unreadable " + entry.path().string());
     }
   }

@@ -173,7 +173,7 @@ faults faults_of_latest(const device& now) {
   const std::string& target = now.latest_target;
   const std::string cure = "remove " + latest;
   if (target.empty() || target == now.view.current_path) return {};
-  if (!target.starts_with(paths::downloads) || now.latest_version == target)
+  if (now.latest_version == target)
     return {fault("%s leads to %s, which is no path of a download", {latest, target}, cure)};
   if (version_of(now.latest_version) == vela_version())
     return {fault("%s names %s, which is no version", {latest, now.latest_version}, cure)};
