@@ -42,6 +42,5 @@ void write_withdrawn(const version_set& versions) {
     static_cast<void>(::unlink(new_withdrawn_list));
     throw;
   }
-  const fs::descriptor storage(::open(paths::storage, O_RDONLY | O_CLOEXEC));
-  check(storage.is_open() && ::fsync(storage.get()) == 0, paths::storage);
+  sync_file_system(paths::storage);
 }
