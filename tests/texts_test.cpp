@@ -124,7 +124,9 @@ TEST(Whole, Zones) {
   for (std::size_t size = 0; size < zone.size(); ++size)
     EXPECT_FALSE(is_whole_zone(zone.substr(0, size))) << size;
   EXPECT_FALSE(is_whole_zone("x" + zone.substr(1)));
-  EXPECT_FALSE(is_whole_zone(std::string(zone).replace(zone.rfind('\n', zone.size() - 2), 1, "x")));
+  const std::size_t footer = zone.rfind('\n', zone.size() - 2);
+  EXPECT_FALSE(is_whole_zone(std::string(zone).replace(footer, 1, "x")));
+  EXPECT_TRUE(is_whole_zone(zone.substr(0, footer) + "\n\n")) << "an empty footer";
   // A first block that says that it is longer than all, where the second one should be.
   zone.erase(44, zone.find("TZif", 1) - 44).replace(32, 1, "\x7f");
   EXPECT_FALSE(is_whole_zone(zone));
