@@ -147,7 +147,7 @@ void inspect_missing(inspection& copy) {
   auto theirs = everything_in(system);
   for (; theirs != std::filesystem::recursive_directory_iterator(); ++theirs) {
     const std::filesystem::path name = theirs->path().lexically_relative(system);
-    if (name == "+VERSION" || !resolve_inside(system, name)) continue;
+    if (!resolve_inside(system, name)) continue;
     if (!inspect_counterpart(copy, theirs->path(), copy.tree / name))
       theirs.disable_recursion_pending();
   }

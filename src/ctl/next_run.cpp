@@ -67,8 +67,7 @@ run_view read_as_a_run() {
   view.latest_path = attempt(view, latest_dataset_path);
   view.current_path = attempt(view, current_dataset_path);
   view.current = attempt(view, [&view] { return vela_dataset(view.current_path.value_or("")); });
-  if (view.latest_path && !view.latest_path->empty())
-    view.latest = attempt(view, [&view] { return vela_dataset(*view.latest_path); });
+  view.latest = attempt(view, [&view] { return vela_dataset(view.latest_path.value_or("")); });
   view.can_change_storage = can_change_storage();
   view.is_zoneinfo_directory = is_real_directory(paths::zoneinfo_link);
   view.is_icutz_directory = is_real_directory(paths::icu_link);

@@ -9,11 +9,10 @@
 struct run_view {
   // Absent where the run that reads it throws.
   std::optional<vela_dataset> system;
-  std::optional<vela_dataset> current;     // the system copy, where `current_path` is absent
-  std::optional<vela_dataset> latest;      // absent also where there is none
-  std::optional<std::string> latest_path;  // empty where there is no tz_latest
-
+  std::optional<vela_dataset> current;      // the system copy, where its path is absent
+  std::optional<vela_dataset> latest;       // the system copy, where its path is absent or empty
   std::optional<std::string> current_path;  // absent where the zoneinfo link names no copy
+  std::optional<std::string> latest_path;   // empty where there is no tz_latest
 
   // Whether the disk or the system failed to read some of it.
   bool is_uncertain = false;

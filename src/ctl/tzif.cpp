@@ -63,9 +63,8 @@ bool take_block(std::string_view& rest, std::size_t time_size) {
 }  // namespace
 
 bool is_whole_zone(std::string_view content) {
-  const bool has_one_block = content.size() > 4 && content[4] == '\0';
   std::string_view rest = content;
   if (!take_block(rest, 4)) return false;
-  if (has_one_block) return rest.empty();
+  if (content[4] == '\0') return rest.empty();  // the first version, with one block
   return take_block(rest, 8) && rest.starts_with('\n') && rest.find('\n', 1) == rest.size() - 1;
 }
