@@ -146,7 +146,7 @@ std::string zone_of(char type_of_transition, char flag, char abbreviation, char 
 TEST(Whole, TablesOfAZone) {
   EXPECT_TRUE(is_whole_zone(zone_of(1, 1, 5, 2)));
   EXPECT_TRUE(is_whole_zone(zone_of(1, 1, 5, 2).replace(42, 1, "\1") + std::string(256, '\0')));
-  EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 5, 2).substr(0, 72))) << "no indicators";
+  EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 5, 2).substr(0, 76))) << "an indicator too few";
   EXPECT_FALSE(is_whole_zone(zone_of(2, 1, 5, 2))) << "a transition to a third type";
   EXPECT_FALSE(is_whole_zone(zone_of(1, 2, 5, 2))) << "neither standard nor daylight time";
   EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 6, 2))) << "an abbreviation behind the table";
