@@ -112,8 +112,9 @@ def test_scene(name):
 def test_marks():
     make(SCENES["steady"]["+"])
     os.system("ASAN_OPTIONS=detect_leaks=0 strace -yo /tmp/trace kestrel 2>/dev/null")
-    marked = re.findall(r"fcntl.*<(.*)>, 0x40 .*, 0x4\)", Path("/tmp/trace").read_text())
-    assert marked == [STORAGE, STORAGE + "/tz"]
+    trace = Path("/tmp/trace").read_text()
+    assert re.findall(r"fcntl.*<(.*)>, 0x40 .*, 0x4\)", trace) == [STORAGE, STORAGE + "/tz"]
+    assert all("CLOEXEC" in call for call in re.findall("open.*(?:/db/|default/|txt).*", trace))
 
 
 # Random worlds are made of these: a path and what may be there, first what is common. "-" is
