@@ -281,7 +281,8 @@ def test_damaged_downloads(row):
     ("ln -s $B/icutz icutz.new; rm icutz; mkdir icutz", "rmdir icutz; kestrel",
      "$S/icutz is no link: remove it, and kestrelctl back 2026b.1.0",
      "$S/icutz.new is of a run that was killed: $RUN", "$LEAVES"),
-    ("ln -s $B/icutz icutz.new", "kestrel", "$S/icutz.new is of a run that was killed: $RUN"),
+    ("ln -s $B/icutz icutz.new", "kestrelctl back 2026b.1.0",
+     "$S/icutz.new is of a run that was killed: $RUN"),
     # The newest download.
     ("cp -r $B tz/2026c; echo 2026c >tz/2026c/zoneinfo/+VERSION; rm tz/2026c/zoneinfo/tz*;"
      "ln -sfn $S/tz/2026c tz_latest",
@@ -441,7 +442,7 @@ def test_status_of_another_user(closed):
 # Why a command changes nothing, after a shell's command on a device that reads 2026c and has 2026b.
 @pytest.mark.parametrize("row", [
     ("", "back 2026z.1.0", 4, "$S/tz/2026z.1.0 is missing"),
-    ("mv $B/icutz/icutz44{l,b}.dat", "back 2026b.1.0", 4,
+    ("mv $B/icutz/icutz44{l,b}.dat; rm -r $B/zoneinfo", "back 2026b.1.0", 4,
      "$B has schema 44b, and the system copy has 44l"),
     ("rm /usr/share/icu/*", "back 2026b.1.0", 4,
      "/usr/share/icu/icutzformat.txt is missing, empty or unreadable: repair the image"),
@@ -750,7 +751,7 @@ def test_closed_copies(closed):
 # What others can change is copied anew, and only with the same content.
 def test_copies_that_others_can_change():
     publish("2026b")
-    sh("chmod g+w $B/zoneinfo/Etc/UTC")
+    sh("chmod g+w $B/zoneinfo/Etc/UTC; echo 2026b.1.0 >withdrawn")
     fetch("2026b")
     for change in ("echo more >zoneinfo/more", "rm -r zoneinfo/more icutz/*.dat",
                    "touch icutz/icutz44l.dat; cp --remove-destination zoneinfo/{Asia/Tokyo,Japan}",
