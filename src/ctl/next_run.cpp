@@ -47,15 +47,12 @@ bool can_change_storage() {
 /// The path of the copy that a run makes active; nothing where it keeps the current one.
 std::optional<std::string> chosen_path(const run_view& view) {
   const std::string system;
-  if (!view.latest_path || !view.current) return system;
-  const bool stays = view.current_path && may_stay(*view.current, *view.system);
+  if (!view.latest_path || !view.current || !view.latest) return system;
   // A run that cannot finish ends on the system copy, whatever the latest dataset is.
   const bool can_finish = view.can_change_storage && !view.is_icutz_directory;
   if (view.has_to_finish && !can_finish) return system;
-  if (!view.latest_path->empty()) {
-    if (!view.latest) return system;
-    if (may_replace(*view.latest, *view.current, *view.system)) return view.latest_path;
-  }
+  if (may_replace(*view.latest, *view.current, *view.system)) return view.latest_path;
+  const bool stays = view.current_path && may_stay(*view.current, *view.system);
   return stays ? std::optional<std::string>() : system;
 }
 
