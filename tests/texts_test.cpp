@@ -155,7 +155,7 @@ TEST(Whole, TablesOfAZone) {
       << "a standard-time indicator for one of two types";
   EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 5, 0).replace(43, 1, "\5"))) << "a name without an end";
   EXPECT_FALSE(is_whole_zone(zone_of(1, 1, 0, 2).replace(61, 6, "names!"))) << "no end at all";
-  EXPECT_FALSE(is_whole_zone("TZif" + std::string(40, '\0'))) << "no type";
+  EXPECT_FALSE(is_whole_zone("TZif" + std::string(39, '\0') + std::string("\1\0", 2))) << "no type";
   const std::string second = zone_of(1, 1, 5, 2).replace(4, 1, "2") + "\nUTC0\n";
   EXPECT_FALSE(is_whole_zone(second)) << "a footer without a second block";
 }
