@@ -141,12 +141,12 @@ NAMES = {
     "AGAIN": "publish 2026b.1.0 again, from good data", "RUN": "start a run of kestrel",
     "LEAVES": "the next run of kestrel goes back to the system copy: see the other lines",
     "FAILS": "the next run of kestrel fails: see the other lines",
-    "UNCHANGEABLE":
-        "is missing, read-only, or append-only: make it a directory that can be changed",
+    "IMMUTABLE": "is missing, read-only, or append-only: make it a directory that can be changed",
     "NO_PATH": f"which is no path of a download: remove {STORAGE}/tz_latest",
     "RETURNS": f"the next run of kestrel switches to {STORAGE}/tz/2026b.1.0: see the other lines",
     "LEADS_OUT": "is a link that leads out of the copy or nowhere",
     "STAGED": f"create_symlink: from {STORAGE}/localtime to {STORAGE}/zoneinfo/Etc/UTC",
+    "UNSWITCHED": f"create_symlink: from {STORAGE}/zoneinfo to {SYSTEM}",
     "NO_ROOM": "there is no room: kestrelctl prune makes some",
     "IN_STEPS": f"this file system cannot replace {STORAGE}/tz/2026b.1.0 in one step: "
                 "publish the data under a higher version",
@@ -348,7 +348,7 @@ def test_damaged_downloads(row):
     # The storage.
     ("mv $S $S.old", "mv $S.old $S", "$S/ is missing or no directory: make it one",
      "$S/tz/ is missing or no directory: make it one", "$S/zoneinfo is missing: $RUN",
-     "$S/localtime is missing: kestrelctl zone NAME", "$FAILS", "$S/ $UNCHANGEABLE"),
+     "$S/localtime is missing: kestrelctl zone NAME", "$FAILS", "$S/ $IMMUTABLE"),
     ("rm -r tz", "mkdir tz; kestrel; rm tz_latest",
      "$S/tz/ is missing or no directory: make it one",
      "$B is missing: $RUN, and remove $S/tz_latest", "$LEAVES"),
@@ -392,7 +392,7 @@ def test_storage_that_cannot_change(close, reopen):
     said = ctl("status")
     sh(reopen)
     assert lines_of(said[0]) == wanted([
-        "$S/icutz.new is of a run that was killed: $RUN", "$FAILS", "$S/ $UNCHANGEABLE"])
+        "$S/icutz.new is of a run that was killed: $RUN", "$FAILS", "$S/ $IMMUTABLE"])
 
 
 def test_what_status_prints():
@@ -420,7 +420,7 @@ def test_status_of_another_user(closed):
     publish("2026b")
     sh("mkdir -m 700 /var/db/icu; : >/var/db/icu/in_use; cd $B/zoneinfo; mkdir Asia/Old;"
        "cp Etc/UTC Asia/Old; ln -s Asia/Old/UTC Old")
-    if "2026c" in closed:
+    if closed in ("$S/tz/2026c", "$B/icutz"):
         sh("cp -r $B tz/2026c; ln -sfn $S/tz/2026c tz_latest")
     path = os.path.expandvars(closed)
     os.chmod(path, 0o700)
@@ -844,7 +844,7 @@ def test_no_zone(name):
 # What a command says of a call that fails, and nothing of what it has complained of before.
 @pytest.mark.parametrize("row", [
     ("zone Etc/UTC", "symlink:error=ENOSPC", 5, "$STAGED: No space left on device", "$NO_ROOM"),
-    ("zone Etc/UTC", "symlink:error=EDQUOT", 5, "$STAGED: Disk quota exceeded", "$NO_ROOM"),
+    ("back", "symlink:error=EDQUOT", 5, "$UNSWITCHED: Disk quota exceeded", "$NO_ROOM"),
     ("zone Etc/UTC", "symlink:error=EROFS", 1, "$S/localtime.new: Read-only file system"),
     ("zone Etc/UTC", "symlink:error=EEXIST:when=1..2", 0),
     ("zone Etc/UTC", "rename:error=EEXIST", 0),
