@@ -108,8 +108,7 @@ std::optional<refusal> add_download(const device& now, const candidate& wanted) 
 /// Whether a whole download is at the path already. One that cannot be read is as good as none.
 bool is_whole_there(const device& now, const candidate& wanted) {
   try {
-    return is_there(wanted.path) && link_target(wanted.path).empty() &&
-           faults_of_download(now, wanted.path, wanted).empty();
+    return link_target(wanted.path).empty() && faults_of_download(now, wanted.path, wanted).empty();
   } catch (const std::system_error&) {
     return false;
   }

@@ -47,10 +47,10 @@ bool take_block(std::string_view& rest, std::size_t time_size) {
   const std::uint64_t types = take_number(counts);
   const std::uint64_t characters = take_number(counts);
   const auto is_none_or_all = [types](std::uint64_t count) { return count == 0 || count == types; };
-  if (types == 0 || !is_none_or_all(ut_indicators) || !is_none_or_all(standard_indicators))
-    return false;
   const std::uint64_t tail = leap_seconds * (time_size + 4) + standard_indicators + ut_indicators;
-  if (rest.size() < transitions * (time_size + 1) + types * 6 + characters + tail) return false;
+  if (types == 0 || !is_none_or_all(ut_indicators) || !is_none_or_all(standard_indicators) ||
+      rest.size() < transitions * (time_size + 1) + types * 6 + characters + tail)
+    return false;
   take(rest, transitions * time_size);
   const std::string_view type_of_each = take(rest, transitions);
   const std::string_view type_table = take(rest, types * 6);
