@@ -672,10 +672,10 @@ def test_storage_of_another_user():
                          r"setresuid\(-1, 1234, -1\) += 0", TRACE.read_text())
 
 
-# A lower version while a newer one waits for its run.
+# A lower version while a newer one waits for its run; the owner's storage may be open to a group.
 @several_users
 def test_a_download_that_waits():
-    sh("chown -hR 1234 .; chmod g+w . tz")  # which its owner may have so
+    sh("chown -hR 1234 .; chmod g+w . tz")
     for release, status in (("2026c", 0), ("2026b", 3)):
         fetch(release)
         assert ctl(f"publish {release}.1.0 DIR", *AS_OWNER)[1] == status
